@@ -1,0 +1,41 @@
+#pragma once
+#include "HostExport.h"
+
+#include <cstdarg>
+#include <cstddef>
+#include <string>
+
+namespace Port {
+
+// The host's string type: an owning text with printf-style formatting.
+template <class Char>
+class StringBase {
+public:
+    StringBase() = default;
+    StringBase(const Char* text) { assign(text); }
+    StringBase(const std::basic_string<Char>& text) : text_(text) {}
+
+    StringBase& operator=(const Char* text) { assign(text); return *this; }
+
+    const Char* c_str() const { return text_.c_str(); }
+    operator const Char*() const { return text_.c_str(); }
+    std::size_t length() const { return text_.size(); }
+    bool empty() const { return text_.empty(); }
+    const std::basic_string<Char>& str() const { return text_; }
+
+    // Replaces the contents with the formatted text.
+    StringBase& doFormat(const Char* format, ...) VORANT_PRINTF(2, 3);
+
+private:
+    void assign(const Char* text) { text_ = text ? text : std::basic_string<Char>(); }
+    std::basic_string<Char> text_;
+};
+
+template <>
+VORANT_HOST_API StringBase<char>& StringBase<char>::doFormat(const char* format, ...);
+
+// The host's text pool: returns a stable copy of text that lives until the
+// host library is unloaded. Equal texts share one copy.
+VORANT_HOST_API char* internText(const char* text);
+
+}  // namespace Port

@@ -1,0 +1,127 @@
+#pragma once
+// The SPI serial flash device: every flash operation becomes shift vectors
+// for the host's scan port, with every opcode, size and wait taken from the
+// part database at construction.
+
+#include "host/Device.h"
+#include "host/PortString.h"
+
+#include <cstdint>
+
+#if defined(VORANT_PLUGIN_BUILDING)
+#  define VORANT_PLUGIN_API VORANT_EXPORT
+#else
+#  define VORANT_PLUGIN_API VORANT_IMPORT
+#endif
+
+class UT_CMDARGS;
+
+namespace VORANT_TYPE1SPINS {
+enum RESULT { NOT_SET = 0, WIP_SET = 1, WEL_SET = 2 };
+}  // namespace VORANT_TYPE1SPINS
+
+class VORANT_PLUGIN_API Type1SPIDevice : public SPIDevice {
+public:
+    explicit Type1SPIDevice(const char* partName);
+    Type1SPIDevice(const Type1SPIDevice&) = default;
+    Type1SPIDevice& operator=(const Type1SPIDevice& other);
+
+    // Overrides, in the order of the table of virtual operations.
+    bool program(int index, UT_CMDARGS* args) override;
+    bool verify(int index, UT_CMDARGS* args) override;
+    bool erase(int index, UT_CMDARGS* args) override;
+    bool readIdcode(int index, bool display) override;
+    bool checkIdcode(int index) override;
+    bool validateInstance(int index) override;
+    bool blankCheck(int index, UT_CMDARGS* args) override;
+    bool readbackToFile(int index, UT_CMDARGS* args) override;
+    bool checksum(int index, UT_CMDARGS* args) override;
+    ~Type1SPIDevice() override;
+    int getOperationProgressCount(const char* operation, UT_CMDARGS* args) override;
+    bool releaseFromStandBy(int index, UT_CMDARGS* args) override;
+    bool spienable(int index, UT_CMDARGS* args) override;
+    bool spidisable(int index, UT_CMDARGS* args) override;
+    bool readDeviceStatus(int index, UT_CMDARGS* args) override;
+    bool compensate(int index) override;
+
+    // Operations this device adds, after all inherited ones.
+    // The verify and checksum engine: "CHECKSUM" (any case) selects checksum
+    // mode, any other name or null verify mode.
+    virtual bool verify(int index, UT_CMDARGS* args, const char* operation);
+    virtual bool checkStatus(int index, int maxWait, int step);
+    virtual VORANT_TYPE1SPINS::RESULT readStatus(int index, const char* bitName);
+    virtual bool readElectronicSignature(int index, bool display);
+
+    bool displayStatusRegisterBits(int index);
+    bool unlockStatusRegister(int index, UT_CMDARGS* args);
+    bool writeQuadEnableBit(int index, UT_CMDARGS* args, bool set);
+
+    // Read-only views of the state tests and hosts may inspect.
+    bool skipIdCheck() const { return skipIdCodeCheck_; }
+    bool usesPolling() const { return dontUsePolling_ == nullptr; }
+    bool x4Programming() const { return x4Programming_; }
+    unsigned char cachedStatusByte() const { return cachedStatus_; }
+
+protected:
+    bool readStatusRegister(Port::StringBase<char> instruction, unsigned char* value);
+
+private:
+    void init(const char* partName);
+
+    // Polling switch: QRX_VORANT_ENV_DONT_USE_POLLING's text, not owned.
+    const char* dontUsePolling_ = nullptr;
+
+    // The sixteen configuration texts.
+    Port::StringBase<char> enableInstruction_;
+    Port::StringBase<char> disableInstruction_;
+    Port::StringBase<char> identificationInstruction_;
+    Port::StringBase<char> readStatusInstruction_;
+    Port::StringBase<char> readStatus2Instruction_;
+    Port::StringBase<char> writeStatusInstruction_;
+    Port::StringBase<char> readInstruction_;
+    Port::StringBase<char> fastReadInstruction_;
+    Port::StringBase<char> pageProgramInstruction_;
+    Port::StringBase<char> sectorEraseInstruction_;
+    Port::StringBase<char> bulkEraseInstruction_;
+    Port::StringBase<char> deepDownInstruction_;
+    Port::StringBase<char> releaseInstruction_;
+    Port::StringBase<char> readSignatureInstruction_;
+    Port::StringBase<char> writeSrInstruction_;
+    Port::StringBase<char> idCode_;
+
+    // The numeric configuration and the erase progress pair.
+    std::int32_t programWaitTimeInc_ = 0;
+    std::int32_t bulkEraseWaitTimeInc_ = 0;
+    std::int32_t writeStatusWaitTime_ = 0;
+    std::int32_t sectorEraseWaitTime_ = 0;
+    std::int32_t addressSize_ = 0;
+    std::int32_t readSize_ = 0;
+    std::int32_t pageSize_ = 0;
+    std::int32_t dataStartIndex_ = 0;
+    std::int32_t pageAddressStartIndex_ = 0;
+    std::int32_t totalShiftSize_ = 0;
+    std::int32_t programMaxWaitTime_ = 0;
+    std::int32_t programWaitTime_ = 0;
+    std::int32_t bulkEraseWaitTime_ = 0;
+    std::int32_t progressEraseWaitTimeInc_ = 0;
+    std::int32_t bulkEraseMaxWaitTime_ = 0;
+    std::int32_t wrsrMaxWaitTime_ = 0;
+    std::int32_t progressEraseWaitTime_ = 0;      // erase progress pair: first wait
+    std::int32_t progressEraseMaxWaitTime_ = 0;   // erase progress pair: limit
+    std::int32_t deviceSize_ = 0;
+    std::int32_t instructionLength_ = 0;
+    std::int32_t statusRegisterLength_ = 0;
+    std::int32_t releaseFromStandbyMaxWaitTime_ = 0;
+
+    // Flags and the cached status byte.
+    bool skipIdCodeCheck_ = false;
+    bool useRes_ = false;
+    bool useUnlockSr_ = false;
+    bool readStatusEnabled_ = false;
+    bool x4Programming_ = false;
+    bool x2Read_ = false;
+    bool x4Read_ = false;
+    unsigned char cachedStatus_ = 0xFF;
+};
+
+extern "C" VORANT_PLUGIN_API Type1SPIDevice* create_type1_spi_device(const char* partName);
