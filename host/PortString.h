@@ -7,6 +7,9 @@
 
 namespace Port {
 
+// The text printf would make of format and args.
+VORANT_HOST_API std::string vformat(const char* format, std::va_list args);
+
 // The host's string type: an owning text with printf-style formatting.
 template <class Char>
 class StringBase {
@@ -23,16 +26,20 @@ public:
     bool empty() const { return text_.empty(); }
     const std::basic_string<Char>& str() const { return text_; }
 
-    // Replaces the contents with the formatted text.
-    StringBase& doFormat(const Char* format, ...) VORANT_PRINTF(2, 3);
+    // Replaces the contents with the text printf would make.
+    StringBase& doFormat(const Char* format, ...) VORANT_PRINTF(2, 3) {
+        static_assert(sizeof(Char) == 1, "formatting is provided for char texts");
+        std::va_list args;
+        va_start(args, format);
+        text_ = vformat(format, args);
+        va_end(args);
+        return *this;
+    }
 
 private:
     void assign(const Char* text) { text_ = text ? text : std::basic_string<Char>(); }
     std::basic_string<Char> text_;
 };
-
-template <>
-VORANT_HOST_API StringBase<char>& StringBase<char>::doFormat(const char* format, ...);
 
 // The host's text pool: returns a stable copy of text that lives until the
 // host library is unloaded. Equal texts share one copy.

@@ -2,6 +2,7 @@
 #include "HostExport.h"
 
 #include <string>
+#include <utility>
 #include <vector>
 
 // One command switch and its arguments.
@@ -12,6 +13,7 @@ public:
     // The i-th argument text, or null when there is none.
     const char* getargtxt(short i) const;
     int argCount() const { return static_cast<int>(args_.size()); }
+    void addArgument(std::string text) { args_.push_back(std::move(text)); }
 
 private:
     std::string name_;

@@ -1,0 +1,223 @@
+#include "ConstraintsManager.h"
+
+#include "PropertyText.h"
+#include "UT_STR.h"
+#include "VorantException.h"
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <set>
+#include <sstream>
+
+#define TOML_EXCEPTIONS 1
+#include <toml++/toml.h>
+
+namespace {
+
+using Properties = std::map<std::string, std::string>;
+
+struct ParsedFile {
+    std::map<std::string, Properties> families;
+    std::map<std::string, Properties> parts;
+};
+
+std::string where(const toml::source_region& region) {
+    return std::to_string(region.begin.line) + ":" + std::to_string(region.begin.column);
+}
+
+// A TOML value as the text the database stores.
+std::string valueText(const toml::node& node, const std::string& context) {
+    if (auto s = node.as_string()) return s->get();
+    if (auto b = node.as_boolean()) return b->get() ? "TRUE" : "FALSE";
+    if (auto i = node.as_integer()) {
+        const std::int64_t v = i->get();
+        if (v < INT32_MIN || v > INT32_MAX)
+            throw VorantException(context + ": " + std::to_string(v) + " is outside the 32-bit range");
+        return std::to_string(v);
+    }
+    throw VorantException(context + ": expected a text, a whole number or true/false");
+}
+
+Properties readTable(const toml::table& table, const std::string& context) {
+    Properties result;
+    for (const auto& [key, node] : table) {
+        const std::string name(key.str());
+        result[name] = valueText(node, context + ": " + name);
+    }
+    return result;
+}
+
+ParsedFile parseFile(const std::string& text, const std::string& sourceName) {
+    toml::table root;
+    try {
+        root = toml::parse(text, sourceName);
+    } catch (const toml::parse_error& error) {
+        throw VorantException(sourceName + ":" + where(error.source()) + ": " + std::string(error.description()));
+    }
+    ParsedFile parsed;
+    for (const auto& [key, node] : root) {
+        const std::string section(key.str());
+        if (section != "family" && section != "part")
+            throw VorantException(sourceName + ": unknown table '" + section +
+                                  "' (a part file holds [family.NAME] and [part.NAME] tables)");
+        const toml::table* entries = node.as_table();
+        if (!entries) throw VorantException(sourceName + ": '" + section + "' must be a table");
+        auto& target = section == "family" ? parsed.families : parsed.parts;
+        for (const auto& [name, body] : *entries) {
+            const std::string entryName(name.str());
+            const toml::table* table = body.as_table();
+            const std::string context = sourceName + ": " + section + " " + entryName;
+            if (!table) throw VorantException(context + ": must be a table of keys");
+            target[entryName] = readTable(*table, context);
+        }
+    }
+    return parsed;
+}
+
+}  // namespace
+
+ConstraintsManager& ConstraintsManager::instance() {
+    static ConstraintsManager manager;
+    return manager;
+}
+
+const ConstraintsManager::Part& ConstraintsManager::part(const char* partName, const char* key) const {
+    auto it = parts_.find(partName ? partName : "");
+    if (it == parts_.end())
+        throw VorantException(std::string("unknown part '") + (partName ? partName : "") +
+                              "' (asked for key '" + (key ? key : "") + "')");
+    return it->second;
+}
+
+const char* ConstraintsManager::getDeviceStringProperty(const char* partName, const char* key) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    const Part& p = part(partName, key);
+    auto it = p.properties.find(key ? key : "");
+    if (it == p.properties.end())
+        throw VorantException(std::string("part '") + partName + "' has no key '" + (key ? key : "") + "'");
+    return it->second.c_str();
+}
+
+std::int32_t ConstraintsManager::getDeviceLongProperty(const char* partName, const char* key) {
+    const std::string text = getDeviceStringProperty(partName, key);
+    auto value = vorant::host::parseInt32(text);
+    if (!value)
+        throw VorantException(std::string("part '") + partName + "' key '" + key + "': '" + text +
+                              "' is not a 32-bit number");
+    return *value;
+}
+
+void ConstraintsManager::loadFile(const std::string& path) {
+    std::ifstream in(path, std::ios::binary);
+    if (!in) throw VorantException(path + ": cannot open the part file");
+    std::ostringstream text;
+    text << in.rdbuf();
+    if (in.bad()) throw VorantException(path + ": cannot read the part file");
+    loadText(text.str(), path);
+}
+
+void ConstraintsManager::loadDirectory(const std::string& path) {
+    namespace fs = std::filesystem;
+    std::error_code error;
+    if (!fs::is_directory(path, error)) throw VorantException(path + ": not a folder of part files");
+    std::vector<fs::path> files;
+    for (const auto& entry : fs::directory_iterator(path, error))
+        if (entry.is_regular_file() && entry.path().extension() == ".toml") files.push_back(entry.path());
+    if (error) throw VorantException(path + ": cannot list the folder: " + error.message());
+    std::sort(files.begin(), files.end());
+    for (const auto& file : files) loadFile(file.string());
+}
+
+void ConstraintsManager::loadText(const std::string& text, const std::string& sourceName) {
+    ParsedFile parsed = parseFile(text, sourceName);
+
+    std::lock_guard<std::mutex> lock(mutex_);
+    // Families of this file see each other and every family loaded before.
+    auto families = families_;
+    for (auto& [name, props] : parsed.families) families[name] = props;
+
+    // Flattens `extends` chains: the nearest definition of a key wins.
+    auto resolve = [&](const std::string& kind, const std::string& name, Properties own) {
+        std::set<std::string> seen;
+        Properties result = own;
+        std::string context = sourceName + ": " + kind + " " + name;
+        while (own.count("extends")) {
+            const std::string parent = own["extends"];
+            if (!seen.insert(parent).second)
+                throw VorantException(context + ": extends: family '" + parent + "' extends itself");
+            auto it = families.find(parent);
+            if (it == families.end())
+                throw VorantException(context + ": extends: unknown family '" + parent + "'");
+            own = it->second;
+            for (const auto& [key, value] : own) result.emplace(key, value);
+        }
+        result.erase("extends");
+        return result;
+    };
+
+    std::map<std::string, Part> resolved;
+    for (auto& [name, props] : parsed.parts) {
+        Properties flat = resolve("part", name, props);
+        validatePart(sourceName, name, flat);
+        resolved[name] = Part{std::move(flat), sourceName};
+    }
+    // Every family must resolve too, so a broken family is reported where
+    // it is written rather than when a later file uses it.
+    for (auto& [name, props] : parsed.families) resolve("family", name, props);
+
+    families_ = std::move(families);
+    for (auto& [name, p] : resolved) parts_[name] = std::move(p);
+}
+
+void ConstraintsManager::addPart(const std::string& partName, const std::map<std::string, std::string>& properties) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    parts_[partName] = Part{properties, ""};
+}
+
+void ConstraintsManager::clear() {
+    std::lock_guard<std::mutex> lock(mutex_);
+    parts_.clear();
+    families_.clear();
+}
+
+bool ConstraintsManager::hasPart(const std::string& partName) const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    return parts_.count(partName) != 0;
+}
+
+bool ConstraintsManager::hasProperty(const std::string& partName, const std::string& key) const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    auto it = parts_.find(partName);
+    return it != parts_.end() && it->second.properties.count(key) != 0;
+}
+
+std::vector<std::string> ConstraintsManager::partNames() const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    std::vector<std::string> names;
+    for (const auto& [name, p] : parts_) names.push_back(name);
+    return names;
+}
+
+std::vector<std::string> ConstraintsManager::partsWithId(const std::string& hexId) const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    std::vector<std::string> names;
+    for (const auto& [name, p] : parts_) {
+        const auto& props = p.properties;
+        std::string id;
+        if (auto it = props.find("JEDEC_ID"); it != props.end()) {
+            id = it->second;
+        } else if (auto idcode = props.find("IDCODE"); idcode != props.end()) {
+            auto res = props.find("USE_RES");
+            if (res == props.end() || UT_STR::ICompare(res->second.c_str(), "TRUE") != 0) id = idcode->second;
+        }
+        if (!id.empty() && UT_STR::ICompare(id.c_str(), hexId.c_str()) == 0) names.push_back(name);
+    }
+    return names;
+}
+
+std::string ConstraintsManager::sourceOf(const std::string& partName) const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    auto it = parts_.find(partName);
+    return it == parts_.end() ? std::string() : it->second.source;
+}

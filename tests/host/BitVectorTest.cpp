@@ -1,0 +1,138 @@
+// The bit vector and its conversions carry the wire contract: bit 0 is the
+// first bit on the wire and every byte travels MSB first.
+#include "host/Hex2Bit.h"
+#include "host/RLBitVec.h"
+#include "host/VorantException.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+namespace {
+
+std::string bits(const RLBitVec& v) {
+    std::string s;
+    for (std::size_t i = 0; i < v.length(); ++i) s += v.getBit(i) ? '1' : '0';
+    return s;
+}
+
+TEST(BitVector, StorageLayoutIsBitIModEightOfByteIDivEight) {
+    RLBitVec v(12, false);
+    v.setBit(0, true);
+    v.setBit(9, true);
+    EXPECT_EQ(v.data()[0], 0x01);
+    EXPECT_EQ(v.data()[1], 0x02);
+    RLBitVec ones(12, true);
+    EXPECT_EQ(ones.data()[1], 0x0F) << "bits past the length stay 0";
+}
+
+TEST(BitVector, TestBitCountsFromTheEnd) {
+    RLBitVec v(8, false);
+    v.setBit(7, true);  // the last bit captured: a status register's bit 0
+    EXPECT_TRUE(v.testBit(0));
+    EXPECT_FALSE(v.testBit(1));
+    EXPECT_EQ(v.data()[0], 0x80);
+}
+
+TEST(BitVector, WorkedPageProgramExampleFromTheWireContract) {
+    // Page program of A5 01 at 0x000100: opcode 02 at bit 0, 24-bit address
+    // at bit 8, data at bit 32.
+    RLBitVec frame(48, false);
+    frame.updateBitField("00000010", 0);
+    frame.updateBitField(0x000100u, 8, 24, true);
+    const unsigned char data[] = {0xA5, 0x01};
+    frame.updateBitField(reinterpret_cast<const char*>(data), 32, 16, true);
+    EXPECT_EQ(bits(frame), "00000010" "000000000000000100000000" "10100101" "00000001");
+    // The byte-array construction lays the data out exactly like the frame.
+    RLBitVec page(data, 16);
+    EXPECT_EQ(bits(page), bits(frame).substr(32));
+}
+
+TEST(BitVector, FieldsWrittenAtUnalignedPositionsMatchAlignedOnes) {
+    const unsigned char data[] = {0x9F, 0x3C, 0xE0};
+    RLBitVec aligned(24, false), shifted(27, false);
+    aligned.updateBitField(reinterpret_cast<const char*>(data), 0, 20, true);
+    shifted.updateBitField(reinterpret_cast<const char*>(data), 3, 20, true);
+    EXPECT_EQ(bits(shifted).substr(3, 20), bits(aligned).substr(0, 20));
+    EXPECT_EQ(bits(aligned).substr(0, 20), "10011111001111001110");
+    RLBitVec lsbFirst(8, false);
+    lsbFirst.updateBitField(reinterpret_cast<const char*>(data), 0, 8, false);
+    EXPECT_EQ(lsbFirst.data()[0], 0x9F);
+}
+
+TEST(BitVector, FieldOutsideTheVectorThrowsAndWritesNothing) {
+    RLBitVec v(16, false);
+    const unsigned char data[] = {0xFF, 0xFF, 0xFF};
+    EXPECT_THROW(v.updateBitField(reinterpret_cast<const char*>(data), 8, 16, true), VorantException);
+    EXPECT_THROW(v.updateBitField(0xFFFFu, 4, 16, true), VorantException);
+    EXPECT_THROW(v.updateBitField("111111111111111111", 0), VorantException);
+    EXPECT_THROW(v.updateBitField(1u, -1, 4, true), VorantException);
+    EXPECT_THROW(v.updateBitField("10x1", 0), VorantException);
+    EXPECT_EQ(bits(v), std::string(16, '0'));
+    EXPECT_THROW(v.testBit(16), VorantException);
+}
+
+TEST(BitVector, EqualsComparesLengthAndBits) {
+    const unsigned char a[] = {0x12, 0x34};
+    EXPECT_TRUE(RLBitVec(a, 16).equals(RLBitVec(a, 16)));
+    EXPECT_FALSE(RLBitVec(a, 16).equals(RLBitVec(a, 15)));
+    RLBitVec changed(a, 16);
+    changed.setBit(15, !changed.getBit(15));
+    EXPECT_FALSE(RLBitVec(a, 16).equals(changed));
+}
+
+TEST(BitVector, UniformValueAnswersBlankOnlyForAllOnes) {
+    struct Case { std::size_t bits; int clearBit; std::uint64_t expected; };
+    const Case cases[] = {
+        {2048, -1, 0xFFFFFFFFu}, {13, -1, 0xFFFFFFFFu}, {2048, 0, RLBitVec::kNotUniform},
+        {2048, 2047, RLBitVec::kNotUniform}, {13, 12, RLBitVec::kNotUniform}, {3, -1, 0xFFFFFFFFu},
+    };
+    for (const auto& c : cases) {
+        RLBitVec v(c.bits, true);
+        if (c.clearBit >= 0) v.setBit(static_cast<std::size_t>(c.clearBit), false);
+        EXPECT_EQ(v.uniformValue(), c.expected) << c.bits << " bits, bit " << c.clearBit << " clear";
+    }
+    EXPECT_EQ(RLBitVec(64, false).uniformValue(), 0u);
+}
+
+TEST(Conversions, IdCodeRoundTripsThroughTheCapturedBits) {
+    auto expected = Hex2Bit::convertHexString2BitVec("EF4018", 24, true, false, false);
+    EXPECT_EQ(bits(*expected), "11101111" "01000000" "00011000");
+    EXPECT_STREQ(Hex2Bit::convertBinData2HexString(expected->data(), 24, true, false), "EF4018");
+    auto lower = Hex2Bit::convertHexString2BitVec("ef4018", 24, true, false, false);
+    EXPECT_TRUE(lower->equals(*expected));
+    auto signature = Hex2Bit::convertHexString2BitVec("17", 8, true, false, false);
+    EXPECT_STREQ(Hex2Bit::convertBinData2HexString(signature->data(), 8, true, false), "17");
+}
+
+TEST(Conversions, ReturnedTextsComeFromThePool) {
+    const unsigned char bytes[] = {0xF7};
+    char* first = Hex2Bit::convertBinData2HexString(bytes, 8, true, false);
+    char* second = Hex2Bit::convertBinData2HexString(bytes, 8, true, false);
+    EXPECT_EQ(first, second) << "equal texts share one pooled copy";
+}
+
+TEST(Conversions, HexTextsThatCannotBeConvertedThrow) {
+    EXPECT_THROW(Hex2Bit::convertHexString2BitVec("EF40G8", 24, true, false, false), VorantException);
+    EXPECT_THROW(Hex2Bit::convertHexString2BitVec("1EF4018", 24, true, false, false), VorantException);
+    auto padded = Hex2Bit::convertHexString2BitVec("18", 24, true, false, false);
+    EXPECT_STREQ(Hex2Bit::convertBinData2HexString(padded->data(), 24, true, false), "000018");
+}
+
+TEST(Conversions, BinaryStringMapsCharacterJToBitJ) {
+    auto v = Hex2Bit::convertBinString2BitVec("10011111", 8, true);
+    EXPECT_EQ(v->length(), 8u);
+    EXPECT_EQ(v->data()[0], 0xF9) << "opcode 9F sent MSB first is the storage byte reversed";
+    EXPECT_THROW(Hex2Bit::convertBinString2BitVec("101", 8, true), VorantException);
+}
+
+TEST(Conversions, IntegerConversionKeepsCapturedOrder) {
+    RLBitVec mask(8, true);
+    Hex2Bit::convertInt2BitVec(0xBF, 8, &mask, false);
+    EXPECT_EQ(mask.data()[0], 0xBF);
+    RLBitVec wide(16, true);
+    Hex2Bit::convertInt2BitVec(0x01, 16, &wide, false);
+    EXPECT_EQ(bits(wide), "1000000000000000");
+}
+
+}  // namespace

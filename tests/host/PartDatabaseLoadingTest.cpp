@@ -1,0 +1,163 @@
+// Loading part files: families, overrides, and one clear error for every
+// value that could make a device misbehave.
+#include "host/ConstraintsManager.h"
+#include "host/VorantException.h"
+#include "tests/support/TestParts.h"
+
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+namespace {
+
+using vorant::test::Properties;
+
+// A part file holding one family with every key of the canonical part, and a
+// part that extends it with the given overrides (TOML lines).
+std::string partFile(const Properties& family, const std::string& partLines) {
+    std::ostringstream toml;
+    toml << "[family.TEST]\n";
+    for (const auto& [key, value] : family) toml << key << " = \"" << value << "\"\n";
+    toml << "\n[part.TESTPART]\nextends = \"TEST\"\n" << partLines;
+    return toml.str();
+}
+
+class PartLoading : public ::testing::Test {
+protected:
+    void SetUp() override { ConstraintsManager::instance().clear(); }
+    void TearDown() override { ConstraintsManager::instance().clear(); }
+    ConstraintsManager& db = ConstraintsManager::instance();
+};
+
+TEST_F(PartLoading, APartInheritsItsFamilyAndOverridesKeys) {
+    db.loadText(partFile(vorant::test::w25q128Properties(), "DEVICE_SIZE = 67108864\nIDCODE = \"EF4017\"\n"
+                                                            "JEDEC_ID = \"EF4017\"\n"),
+                "winbond.toml");
+    EXPECT_EQ(db.getDeviceLongProperty("TESTPART", "DEVICE_SIZE"), 67108864);
+    EXPECT_STREQ(db.getDeviceStringProperty("TESTPART", "READ_INSTRUCTION"), "00000011");
+    EXPECT_EQ(db.sourceOf("TESTPART"), "winbond.toml");
+    EXPECT_FALSE(db.hasPart("TEST")) << "a family is not a part";
+    EXPECT_EQ(db.partsWithId("ef4017"), std::vector<std::string>{"TESTPART"});
+}
+
+TEST_F(PartLoading, TomlTypesBecomeTheDatabaseTexts) {
+    db.loadText(partFile(vorant::test::w25q128Properties(), "X4_READ = false\nPAGE_SIZE = 2048\n"), "t.toml");
+    EXPECT_STREQ(db.getDeviceStringProperty("TESTPART", "X4_READ"), "FALSE");
+    EXPECT_STREQ(db.getDeviceStringProperty("TESTPART", "PAGE_SIZE"), "2048");
+}
+
+TEST_F(PartLoading, UnknownPartsAndKeysNameWhatWasAsked) {
+    db.loadText(partFile(vorant::test::w25q128Properties(), ""), "t.toml");
+    try {
+        db.getDeviceStringProperty("NOPART", "PAGE_SIZE");
+        FAIL();
+    } catch (const VorantException& e) {
+        EXPECT_NE(std::string(e.what()).find("NOPART"), std::string::npos);
+        EXPECT_NE(std::string(e.what()).find("PAGE_SIZE"), std::string::npos);
+    }
+    try {
+        db.getDeviceStringProperty("TESTPART", "STATUS_LOCATION_99");
+        FAIL();
+    } catch (const VorantException& e) {
+        EXPECT_NE(std::string(e.what()).find("STATUS_LOCATION_99"), std::string::npos);
+    }
+}
+
+TEST_F(PartLoading, SeveralPartsMayShareAnId) {
+    auto props = vorant::test::w25q128Properties();
+    db.loadText(partFile(props, "") + "\n[part.SECOND]\nextends = \"TEST\"\n", "t.toml");
+    EXPECT_EQ(db.partsWithId("EF4018"), (std::vector<std::string>{"SECOND", "TESTPART"}));
+}
+
+struct BadPart {
+    const char* what;
+    const char* lines;       // TOML lines added to the part
+    const char* key;         // the key the error must name
+};
+
+class InvalidParts : public PartLoading, public ::testing::WithParamInterface<BadPart> {};
+
+TEST_P(InvalidParts, AreRejectedNamingFilePartAndKey) {
+    const BadPart& bad = GetParam();
+    try {
+        db.loadText(partFile(vorant::test::w25q128Properties(), bad.lines), "vendor.toml");
+        FAIL() << bad.what << " was accepted";
+    } catch (const VorantException& e) {
+        const std::string text = e.what();
+        EXPECT_NE(text.find("vendor.toml"), std::string::npos) << text;
+        EXPECT_NE(text.find(bad.key), std::string::npos) << text;
+    }
+    EXPECT_FALSE(db.hasPart("TESTPART")) << "nothing of a failed file is added";
+}
+
+const BadPart kBadParts[] = {
+    {"zero page size", "PAGE_SIZE = 0\n", "PAGE_SIZE"},
+    {"negative device size", "DEVICE_SIZE = -8\n", "DEVICE_SIZE"},
+    {"page size not whole bytes", "PAGE_SIZE = 2044\nTOTAL_SHIFT_SIZE = 2076\n", "PAGE_SIZE"},
+    {"zero polling step", "PROGRAM_WAITTIME_INC = 0\n", "PROGRAM_WAITTIME_INC"},
+    {"zero erase step", "BULKERASE_WAITTIME_INC = 0\n", "BULKERASE_WAITTIME_INC"},
+    {"zero progress divisor", "PROGRESS_ERASE_WAITTIME_INC = 0\n", "PROGRESS_ERASE_WAITTIME_INC"},
+    {"address over 32 bits", "ADDRESS_SIZE = 40\nREAD_SIZE = 48\nDATA_START_INDEX = 48\nTOTAL_SHIFT_SIZE = 2096\n",
+     "ADDRESS_SIZE"},
+    {"instruction not binary", "READ_INSTRUCTION = \"0000 011\"\n", "READ_INSTRUCTION"},
+    {"instruction in hex", "ENABLE_INSTRUCTION = \"06\"\n", "ENABLE_INSTRUCTION"},
+    {"read instruction overlaps address", "READ_INSTRUCTION = \"0000001100\"\n", "PAGE_ADDRESS_START_INDEX"},
+    {"data past the frame", "TOTAL_SHIFT_SIZE = 2072\n", "TOTAL_SHIFT_SIZE"},
+    {"address past the read frame", "READ_SIZE = 24\n", "READ_SIZE"},
+    {"status read under 8 bits", "READSTATUS_INSTRUCTION = \"0101\"\n", "READSTATUS_INSTRUCTION"},
+    {"program poll overflows", "PROGRAM_MAXWAITTIME = 2147483600\n", "PROGRAM_MAXWAITTIME"},
+    {"erase poll overflows", "BULKERASE_MAXWAITTIME = 2147483647\n", "BULKERASE_MAXWAITTIME"},
+    {"number past 32 bits", "DEVICE_SIZE = 4294967296\n", "DEVICE_SIZE"},
+    {"number as text", "PAGE_SIZE = \"2k\"\n", "PAGE_SIZE"},
+    {"short ID", "IDCODE = \"EF40\"\n", "IDCODE"},
+    {"RES part with a JEDEC ID", "USE_RES = \"TRUE\"\n", "IDCODE"},
+    {"flag typo", "USE_UNLOCKSR = \"TURE\"\n", "USE_UNLOCKSR"},
+    {"x4 without two status bytes", "STATUS_REGISTER_LENGTH = 8\n", "STATUS_REGISTER_LENGTH"},
+    {"negative wait", "WRSR_MAXWAITTIME = -1\n", "WRSR_MAXWAITTIME"},
+    {"bad QE location", "QE_LOCATION = \"SR3.1\"\n", "QE_LOCATION"},
+    {"float value", "PAGE_SIZE = 2048.0\n", "PAGE_SIZE"},
+    {"malformed TOML", "PAGE_SIZE = = 3\n", "vendor.toml"},
+};
+INSTANTIATE_TEST_SUITE_P(Validation, InvalidParts, ::testing::ValuesIn(kBadParts));
+
+TEST_F(PartLoading, AMissingKeyIsNamed) {
+    auto props = vorant::test::w25q128Properties();
+    props.erase("WRSR_MAXWAITTIME");
+    try {
+        db.loadText(partFile(props, ""), "vendor.toml");
+        FAIL();
+    } catch (const VorantException& e) {
+        EXPECT_NE(std::string(e.what()).find("WRSR_MAXWAITTIME"), std::string::npos);
+        EXPECT_NE(std::string(e.what()).find("TESTPART"), std::string::npos);
+    }
+}
+
+TEST_F(PartLoading, AnUnknownOrCircularFamilyIsNamed) {
+    const std::pair<const char*, const char*> cases[] = {
+        {"[part.P]\nextends = \"NOFAMILY\"\n", "NOFAMILY"},
+        {"[family.A]\nextends = \"B\"\n[family.B]\nextends = \"A\"\n", "extends itself"},
+        {"[parts.P]\n", "unknown table 'parts'"},
+    };
+    for (const auto& [text, expected] : cases) {
+        try {
+            db.loadText(text, "vendor.toml");
+            FAIL() << text;
+        } catch (const VorantException& e) {
+            EXPECT_NE(std::string(e.what()).find(expected), std::string::npos) << e.what();
+        }
+    }
+}
+
+TEST_F(PartLoading, InMemoryPartsSkipValidation) {
+    auto props = vorant::test::w25q128Properties();
+    props["PAGE_SIZE"] = "0";
+    db.addPart("DEGENERATE", props);
+    EXPECT_EQ(db.getDeviceLongProperty("DEGENERATE", "PAGE_SIZE"), 0);
+}
+
+TEST_F(PartLoading, MissingFilesAndFoldersAreClearErrors) {
+    EXPECT_THROW(db.loadFile("/nonexistent/parts.toml"), VorantException);
+    EXPECT_THROW(db.loadDirectory("/nonexistent-folder"), VorantException);
+}
+
+}  // namespace

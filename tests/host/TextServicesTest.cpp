@@ -1,0 +1,58 @@
+#include "host/PortString.h"
+#include "host/UT_STR.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+
+namespace {
+
+TEST(TextServices, ICompareIgnoresCaseOnly) {
+    struct Case { const char* a; const char* b; bool equal; };
+    const Case cases[] = {
+        {"TRUE", "TRUE", true}, {"true", "TRUE", true}, {"True", "TRUE", true},
+        {"TRUE ", "TRUE", false}, {"TRUE1", "TRUE", false}, {"", "TRUE", false},
+        {nullptr, "TRUE", false}, {nullptr, nullptr, true},
+    };
+    for (const auto& c : cases)
+        EXPECT_EQ(UT_STR::ICompare(c.a, c.b) == 0, c.equal) << (c.a ? c.a : "(null)") << " vs " << c.b;
+}
+
+TEST(TextServices, IMatchIsACaseInsensitiveWildcardMatch) {
+    struct Case { const char* text; const char* pattern; bool match; };
+    const Case cases[] = {
+        {"NOT_VALID", "NOT_VALID", true}, {"not_valid", "NOT_VALID", true}, {"NOT_VALID ", "NOT_VALID", false},
+        {"W25Q128JV", "w25q*", true},     {"W25Q128JV", "*128*", true},     {"W25Q128JV", "W25Q?28JV", true},
+        {"W25Q128JV", "MX*", false},      {"", "*", true},                  {"abc", "", false},
+        {"CHECKSUM", "CHECKSUM", true},   {"aaaaaaaaaaab", "*a*a*a*b", true}, {nullptr, "*", false},
+    };
+    for (const auto& c : cases)
+        EXPECT_EQ(UT_STR::IMatch(c.text, c.pattern) != 0, c.match)
+            << (c.text ? c.text : "(null)") << " ~ " << c.pattern;
+}
+
+TEST(TextServices, DupGivesAStablePooledCopy) {
+    std::string name = "readback.bin";
+    char* copy = UT_STR::Dup(name.c_str());
+    name[0] = 'X';
+    EXPECT_STREQ(copy, "readback.bin");
+}
+
+TEST(TextServices, GetEnvAnswersNullForUndefinedVariables) {
+    ::setenv("VORANT_TEST_VARIABLE", "", 1);
+    ASSERT_NE(Port_Env::GetEnv("VORANT_TEST_VARIABLE"), nullptr) << "defined but empty still counts";
+    ::unsetenv("VORANT_TEST_VARIABLE");
+    EXPECT_EQ(Port_Env::GetEnv("VORANT_TEST_VARIABLE"), nullptr);
+}
+
+TEST(TextServices, StringFormatting) {
+    Port::StringBase<char> key;
+    key.doFormat("STATUS_LOCATION_%d", 15);
+    EXPECT_STREQ(key.c_str(), "STATUS_LOCATION_15");
+    Port::StringBase<char> copy = key;
+    key = "other";
+    EXPECT_STREQ(copy.c_str(), "STATUS_LOCATION_15");
+    EXPECT_EQ(Port::StringBase<char>(nullptr).length(), 0u);
+}
+
+}  // namespace
