@@ -7,6 +7,7 @@
 #include "host/PortString.h"
 
 #include <cstdint>
+#include <memory>
 
 #if defined(VORANT_PLUGIN_BUILDING)
 #  define VORANT_PLUGIN_API VORANT_EXPORT
@@ -64,6 +65,10 @@ public:
 
 protected:
     bool readStatusRegister(Port::StringBase<char> instruction, unsigned char* value);
+
+    // The instruction frame of a bare instruction: the '0'/'1' text as a
+    // vector as long as the text, first character first on the wire.
+    static std::unique_ptr<RLBitVec> instructionFrame(const Port::StringBase<char>& instruction);
 
 private:
     void init(const char* partName);
