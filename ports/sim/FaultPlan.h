@@ -1,0 +1,52 @@
+#pragma once
+// Faults the simulated flash and its scan port can inject, for tests and
+// demonstrations. A default-constructed plan injects nothing.
+
+#include <cstdint>
+#include <vector>
+
+namespace vorant::sim {
+
+// A byte whose `mask` bits always read as the matching bits of `value`,
+// whatever was programmed or erased: a damaged cell, so verify fails there.
+struct StuckBits {
+    std::uint32_t address = 0;
+    std::uint8_t mask = 0;
+    std::uint8_t value = 0;
+};
+
+struct FaultPlan {
+    // --- The chip (FlashModel) ---
+
+    // Once a program, erase or status write sets WIP it never clears (the
+    // operation's effect on the array and registers still happens).
+    bool stuckBusy = false;
+    // Bits that read as fixed values; memory() keeps what was written, only
+    // the answers on the wire are affected.
+    std::vector<StuckBits> stuckBits;
+    // The block-protect bits of status register 1 are all set at power-on.
+    bool protectAtPowerOn = false;
+    // The chip powers up in deep power-down: only the release/signature
+    // command is answered.
+    bool startInDeepPowerDown = false;
+
+    // --- The scan port (SimScanPort) ---
+
+    // Calls to shift and shiftWrite are counted together from 1. The call
+    // numbered failShiftAt fails (0: none); failAllShifts fails every one.
+    // A failed shift puts nothing on the wire and leaves tdo alone.
+    int failShiftAt = 0;
+    bool failAllShifts = false;
+    // Calls to wait are counted from 1. The call numbered failWaitAt fails
+    // (0: none); failAllWaits fails every one. A failed wait still closes an
+    // open transaction but lets no time pass.
+    int failWaitAt = 0;
+    bool failAllWaits = false;
+    // isCancelled answers false to the first cancelAfterQueries queries and
+    // true to every query after them (query cancelAfterQueries + 1 on).
+    // Negative: never. 0: from the first query. The plug-in asks once per
+    // page, so N means "cancel after N pages".
+    int cancelAfterQueries = -1;
+};
+
+}  // namespace vorant::sim

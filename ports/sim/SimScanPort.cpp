@@ -1,0 +1,190 @@
+#include "ports/sim/SimScanPort.h"
+
+#include <algorithm>
+#include <array>
+#include <exception>
+
+namespace vorant::sim {
+
+namespace {
+
+static_assert(std::atomic<bool>::is_always_lock_free, "the cancel flag must be usable from a signal handler");
+
+// A shift vector stores the first bit on the wire in bit 0 of byte 0, while
+// SPI sends a byte most significant bit first: a byte-aligned wire byte is
+// its storage byte mirrored.
+constexpr std::array<std::uint8_t, 256> makeMirrorTable() {
+    std::array<std::uint8_t, 256> table{};
+    for (unsigned value = 0; value < 256; ++value) {
+        unsigned mirrored = 0;
+        for (unsigned bit = 0; bit < 8; ++bit)
+            if (value & (1u << bit)) mirrored |= 0x80u >> bit;
+        table[value] = static_cast<std::uint8_t>(mirrored);
+    }
+    return table;
+}
+constexpr std::array<std::uint8_t, 256> kMirror = makeMirrorTable();
+
+constexpr std::size_t kChunkBytes = 4096;
+
+}  // namespace
+
+SimScanPort::SimScanPort(FlashConfig config, FaultPlan faults, const std::string& backingFile)
+    : model_(std::move(config), faults, backingFile), faults_(std::move(faults)) {}
+
+bool SimScanPort::fail(const std::string& why) {
+    lastError_ = why;
+    return false;
+}
+
+bool SimScanPort::shiftFails() {
+    return faults_.failAllShifts ||
+           (faults_.failShiftAt > 0 && stats_.shiftCalls == static_cast<std::uint64_t>(faults_.failShiftAt));
+}
+
+void SimScanPort::openTransaction() {
+    if (open_) closeTransaction();
+    model_.select();
+    open_ = true;
+    ++stats_.transactions;
+}
+
+void SimScanPort::closeTransaction() {
+    open_ = false;
+    model_.deselect();
+}
+
+bool SimScanPort::shift(int stage, RLBitVec* tdi, RLBitVec*, RLBitVec* tdo, RLBitVec*) {
+    ++stats_.shiftCalls;
+    if (shiftFails()) return fail("shift call " + std::to_string(stats_.shiftCalls) + " failed (injected fault)");
+    if (tdi == nullptr) return fail("shift without bits to drive");
+    const bool continues = stage == ScanStage::kContinue || stage == ScanStage::kClose ||
+                           stage == ScanStage::kCaptureClose;
+    if (continues && !open_)
+        return fail("shift stage " + std::to_string(stage) + " without an open transaction");
+    try {
+        switch (stage) {
+        case ScanStage::kWhole:
+            openTransaction();
+            clock(*tdi, nullptr);
+            closeTransaction();
+            return true;
+        case ScanStage::kOpen:
+            openTransaction();
+            clock(*tdi, nullptr);
+            return true;
+        case ScanStage::kContinue:
+            clock(*tdi, nullptr);
+            return true;
+        case ScanStage::kClose:
+            clock(*tdi, nullptr);
+            closeTransaction();
+            return true;
+        case ScanStage::kCaptureClose:
+            clock(*tdi, tdo);
+            closeTransaction();
+            return true;
+        default:
+            return fail("unknown shift stage " + std::to_string(stage));
+        }
+    } catch (const std::exception& error) {
+        return fail(error.what());
+    }
+}
+
+bool SimScanPort::shiftWrite(int stage, RLBitVec* tdi, int) { return shift(stage, tdi, nullptr, nullptr, nullptr); }
+
+bool SimScanPort::transaction(const RLBitVec& tdi, RLBitVec* captured) {
+    ++stats_.shiftCalls;
+    if (shiftFails()) return fail("shift call " + std::to_string(stats_.shiftCalls) + " failed (injected fault)");
+    try {
+        openTransaction();
+        clock(tdi, captured);
+        closeTransaction();
+        return true;
+    } catch (const std::exception& error) {
+        return fail(error.what());
+    }
+}
+
+bool SimScanPort::wait(int time, bool) {
+    ++stats_.waitCalls;
+    try {
+        if (open_) closeTransaction();
+    } catch (const std::exception& error) {
+        return fail(error.what());
+    }
+    if (faults_.failAllWaits ||
+        (faults_.failWaitAt > 0 && stats_.waitCalls == static_cast<std::uint64_t>(faults_.failWaitAt)))
+        return fail("wait call " + std::to_string(stats_.waitCalls) + " failed (injected fault)");
+    if (time < 0) return fail("wait of a negative time (" + std::to_string(time) + " us)");
+    model_.advance(static_cast<std::uint64_t>(time) * 1000u);
+    return true;
+}
+
+bool SimScanPort::isCancelled(int) {
+    ++stats_.cancelQueries;
+    if (faults_.cancelAfterQueries >= 0 &&
+        stats_.cancelQueries > static_cast<std::uint64_t>(faults_.cancelAfterQueries))
+        return true;
+    return cancel_.load();
+}
+
+SimStats SimScanPort::stats() const {
+    SimStats stats = stats_;
+    stats.simulatedNs = model_.now();
+    return stats;
+}
+
+// Clocks the bits of tdi onto the chip, storing MISO into the first
+// captureBits bits of captured. captured may be tdi itself: every storage
+// byte is read before the same byte is written.
+void SimScanPort::clock(const RLBitVec& tdi, RLBitVec* captured) {
+    const std::size_t bits = tdi.length();
+    const std::size_t wholeBytes = bits / 8;
+    const std::size_t tailBits = bits % 8;
+    const std::size_t captureBits = captured ? std::min(captured->length(), bits) : 0;
+    const std::size_t captureWholeBytes = captureBits / 8;
+    const std::uint8_t* in = tdi.data();
+    std::uint8_t* out = captured ? captured->data() : nullptr;
+
+    // Stores a received wire byte into storage byte `index` where it lies
+    // within the captured bits.
+    auto store = [&](std::size_t index, std::uint8_t wireByte) {
+        if (index < captureWholeBytes) {
+            out[index] = kMirror[wireByte];
+        } else if (index * 8 < captureBits) {
+            const auto keep = static_cast<std::uint8_t>((1u << (captureBits - index * 8)) - 1);
+            out[index] = static_cast<std::uint8_t>((out[index] & ~keep) | (kMirror[wireByte] & keep));
+        }
+    };
+
+    std::uint8_t wire[kChunkBytes];
+    std::uint8_t received[kChunkBytes];
+    for (std::size_t done = 0; done < wholeBytes;) {
+        const std::size_t n = std::min(kChunkBytes, wholeBytes - done);
+        for (std::size_t k = 0; k < n; ++k) wire[k] = kMirror[in[done + k]];
+        const bool capturing = done * 8 < captureBits;
+        model_.clockBytes(wire, capturing ? received : nullptr, n);
+        if (capturing) {
+            for (std::size_t k = 0; k < n; ++k) store(done + k, received[k]);
+        }
+        done += n;
+    }
+
+    if (tailBits) {
+        const std::uint8_t tailIn = in[wholeBytes];
+        for (std::size_t bit = 0; bit < tailBits; ++bit) {
+            const bool miso = model_.clockBit(((tailIn >> bit) & 1) != 0);
+            const std::size_t index = wholeBytes * 8 + bit;
+            if (index < captureBits) {
+                const auto mask = static_cast<std::uint8_t>(1u << bit);
+                out[wholeBytes] = miso ? static_cast<std::uint8_t>(out[wholeBytes] | mask)
+                                       : static_cast<std::uint8_t>(out[wholeBytes] & ~mask);
+            }
+        }
+    }
+    stats_.bitsShifted += bits;
+}
+
+}  // namespace vorant::sim
