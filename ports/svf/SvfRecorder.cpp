@@ -1,0 +1,247 @@
+#include "ports/svf/SvfRecorder.h"
+
+#include "ports/svf/SvfError.h"
+#include "ports/svf/SvfHex.h"
+#include "ports/svf/SvfParser.h"
+#include "ports/svf/SvfSeconds.h"
+
+#include <algorithm>
+#include <ctime>
+#include <sstream>
+#include <utility>
+
+namespace vorant::svf {
+namespace {
+
+// The buffer is written out whenever it grows past this.
+constexpr std::size_t kFlushThreshold = 256 * 1024;
+
+// Set-up statements every SVF player knows: no test reset line, both scan
+// kinds end in Run-Test/Idle, the TAP is walked through reset to idle, and
+// no header or trailer bits surround the scans.
+constexpr const char* kSetup =
+    "TRST OFF;\n"
+    "ENDIR IDLE;\n"
+    "ENDDR IDLE;\n"
+    "STATE RESET;\n"
+    "STATE IDLE;\n"
+    "HDR 0;\n"
+    "HIR 0;\n"
+    "TDR 0;\n"
+    "TIR 0;\n";
+
+// A name inside a one-line comment must not break the line.
+std::string oneLine(std::string text) {
+    std::replace(text.begin(), text.end(), '\n', ' ');
+    std::replace(text.begin(), text.end(), '\r', ' ');
+    return text;
+}
+
+std::string joinedPreamble(const std::vector<std::string>& lines) {
+    std::string text;
+    for (const std::string& line : lines) {
+        text += line;
+        if (text.empty() || text.back() != '\n') text += '\n';
+    }
+    return text;
+}
+
+// A broken preamble would make every recorded file unplayable; refuse it
+// before anything is created.
+std::filesystem::path checkedTarget(std::filesystem::path target, const SvfRecorderOptions& options) {
+    if (!options.preamble.empty()) {
+        std::istringstream text(joinedPreamble(options.preamble));
+        SvfParser parser(text);
+        SvfStatement statement;
+        try {
+            while (parser.next(statement)) {
+            }
+        } catch (const SvfParseError& error) {
+            throw SvfError("cannot write '" + target.string() + "': preamble line " +
+                           std::to_string(error.line()) + ": " + error.reason());
+        }
+    }
+    return target;
+}
+
+std::string utcDate() {
+    const std::time_t now = std::time(nullptr);
+    const std::tm* utc = std::gmtime(&now);
+    char text[32] = "";
+    if (utc != nullptr) std::strftime(text, sizeof text, "%Y-%m-%d %H:%M:%SZ", utc);
+    return text;
+}
+
+// The first `bits` bits of a vector, zeros where the vector is shorter.
+void appendClipped(BitBuffer& out, const RLBitVec* vector, std::size_t bits) {
+    const std::size_t available = vector == nullptr ? 0 : std::min(bits, vector->length());
+    if (available > 0) out.append(vector->data(), available);
+    out.appendZeros(bits - available);
+}
+
+}  // namespace
+
+SvfRecorder::SvfRecorder(std::filesystem::path target, SvfRecorderOptions options)
+    : file_(checkedTarget(std::move(target), options)) {
+    buffer_.reserve(kFlushThreshold + 64 * 1024);
+    writeHeader(options);
+    flushBuffer();
+}
+
+SvfRecorder::~SvfRecorder() = default;
+
+void SvfRecorder::writeHeader(const SvfRecorderOptions& options) {
+    if (!options.toolName.empty()) buffer_ += "// SVF written by " + oneLine(options.toolName) + "\n";
+    if (!options.partName.empty()) buffer_ += "// Part: " + oneLine(options.partName) + "\n";
+    if (options.timestamp) buffer_ += "// Date: " + utcDate() + "\n";
+    buffer_ += "// One SDR per SPI transaction: chip select is asserted for the length of each SDR.\n";
+    buffer_ += kSetup;
+    buffer_ += joinedPreamble(options.preamble);
+}
+
+void SvfRecorder::comment(const char* text) {
+    if (text == nullptr || !usable()) return;
+    writeCommentLines(text);
+    flushIfFull();
+}
+
+void SvfRecorder::writeCommentLines(const char* text) {
+    std::string& out = open_ ? heldComments_ : buffer_;
+    // Every line of the text becomes a comment line of its own, so a text
+    // with line breaks can never turn into statements.
+    std::string_view rest(text);
+    while (!rest.empty()) {
+        const std::size_t end = std::min(rest.find('\n'), rest.size());
+        std::string_view line = rest.substr(0, end);
+        rest.remove_prefix(std::min(end + 1, rest.size()));
+        while (!line.empty() && line.back() == '\r') line.remove_suffix(1);
+        if (line.empty()) continue;
+        if (line.substr(0, 2) != "//" && line.front() != '!') out += "//";
+        out += line;
+        out += '\n';
+        ++totals_.commentCount;
+    }
+}
+
+bool SvfRecorder::shift(int stage, RLBitVec* tdi, RLBitVec* /*tdiMask*/, RLBitVec* tdo, RLBitVec* tdoMask) {
+    if (!usable() || tdi == nullptr) return false;
+    switch (stage) {
+    case ScanStage::kWhole:
+        closeTransaction();
+        addShift(*tdi, tdo, tdoMask);
+        closeTransaction();
+        break;
+    case ScanStage::kOpen:
+        closeTransaction();
+        addShift(*tdi, tdo, tdoMask);
+        break;
+    case ScanStage::kContinue:
+        if (!open_) return false;  // nothing selected the chip: as the simulator, refuse
+        addShift(*tdi, tdo, tdoMask);
+        break;
+    case ScanStage::kClose:
+    case ScanStage::kCaptureClose:
+        if (!open_) return false;
+        addShift(*tdi, tdo, tdoMask);
+        closeTransaction();
+        break;
+    default:
+        return false;
+    }
+    flushIfFull();
+    return usable();
+}
+
+bool SvfRecorder::shiftWrite(int stage, RLBitVec* tdi, int /*reserved*/) {
+    return shift(stage, tdi, nullptr, nullptr, nullptr);
+}
+
+bool SvfRecorder::wait(int time, bool /*microseconds: always true*/) {
+    if (!usable()) return false;
+    // The wait comes after the deselect: a status write only starts when
+    // chip select rises.
+    closeTransaction();
+    if (time < 0) return false;
+    if (time > 0) {
+        buffer_ += "RUNTEST ";
+        buffer_ += formatSvfSeconds(static_cast<std::uint64_t>(time));
+        buffer_ += " SEC;\n";
+        ++totals_.runTestCount;
+        totals_.runTestMicroseconds += static_cast<std::uint64_t>(time);
+    }
+    flushIfFull();
+    return usable();
+}
+
+bool SvfRecorder::isCancelled(int /*level*/) { return cancelRequested_.load() || file_.failed(); }
+
+void SvfRecorder::addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBitVec* tdoMask) {
+    const std::size_t bits = tdi.length();
+    const std::size_t before = tdi_.size();
+    open_ = true;
+    tdi_.append(tdi.data(), bits);
+    const bool masked = tdoMask != nullptr && anyBitSet(tdoMask->data(), std::min(bits, tdoMask->length()));
+    if (masked && !compares_) {
+        // Shifts before the first compared one compare nothing.
+        compares_ = true;
+        tdo_.assign(before, false);
+        mask_.assign(before, false);
+    }
+    if (masked) {
+        appendClipped(tdo_, tdo, bits);
+        appendClipped(mask_, tdoMask, bits);
+    } else if (compares_) {
+        tdo_.appendZeros(bits);
+        mask_.appendZeros(bits);
+    }
+}
+
+void SvfRecorder::closeTransaction() {
+    if (!open_) return;
+    if (!tdi_.empty()) writeSdr();
+    open_ = false;
+    compares_ = false;
+    tdi_.clear();
+    tdo_.clear();
+    mask_.clear();
+    buffer_ += heldComments_;
+    heldComments_.clear();
+}
+
+void SvfRecorder::writeSdr() {
+    const std::size_t bits = tdi_.size();
+    buffer_ += "SDR ";
+    buffer_ += std::to_string(bits);
+    buffer_ += " TDI (";
+    appendSvfHex(buffer_, tdi_.data(), bits, kDigitsPerLine);
+    buffer_ += ')';
+    if (compares_) {
+        buffer_ += " TDO (";
+        appendSvfHex(buffer_, tdo_.data(), bits, kDigitsPerLine);
+        buffer_ += ") MASK (";
+        appendSvfHex(buffer_, mask_.data(), bits, kDigitsPerLine);
+        buffer_ += ')';
+    }
+    buffer_ += ";\n";
+    ++totals_.sdrCount;
+    totals_.sdrBits += bits;
+}
+
+void SvfRecorder::flushIfFull() {
+    if (buffer_.size() >= kFlushThreshold) flushBuffer();
+}
+
+void SvfRecorder::flushBuffer() {
+    file_.write(buffer_);
+    buffer_.clear();
+}
+
+void SvfRecorder::finish() {
+    if (finished_) throw SvfError("'" + target().string() + "' is already finished");
+    closeTransaction();
+    flushBuffer();
+    finished_ = true;
+    file_.commit();
+}
+
+}  // namespace vorant::svf

@@ -1,0 +1,110 @@
+#pragma once
+// A scan port that records every transfer as SVF instead of playing it.
+//
+// One SDR per SPI transaction: all shifts from chip select to deselect are
+// joined into one scan (the convention for hardware is that chip select is
+// asserted for the length of each SDR). TDI is always written; TDO and MASK
+// only when the transaction compares something. Waits become RUNTEST
+// statements, comments SVF comments. The text is streamed through a buffer
+// into a temporary file that finish() renames onto the target, so a run
+// that fails or is cancelled leaves no half-written file behind.
+
+#include "host/RLBitVec.h"
+#include "host/ScanPort.h"
+#include "ports/svf/AtomicOutputFile.h"
+#include "ports/svf/BitBuffer.h"
+
+#include <atomic>
+#include <cstdint>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+namespace vorant::svf {
+
+struct SvfRecorderOptions {
+    // Named in the header comments when not empty.
+    std::string toolName;
+    std::string partName;
+    // Adds the recording date (UTC) to the header. Off by default so the
+    // same run always gives the same file.
+    bool timestamp = false;
+    // Lines written as they are after the set-up statements, for example an
+    // SIR that selects the user's SPI bridge.
+    std::vector<std::string> preamble;
+};
+
+struct SvfRecorderTotals {
+    std::uint64_t sdrCount = 0;
+    std::uint64_t sdrBits = 0;
+    std::uint64_t runTestCount = 0;
+    std::uint64_t runTestMicroseconds = 0;
+    std::uint64_t commentCount = 0;
+};
+
+class SvfRecorder final : public ScanPort {
+public:
+    // Opens the temporary file and writes the header. Throws SvfError naming
+    // the file when it cannot be written; nothing is created then.
+    explicit SvfRecorder(std::filesystem::path target, SvfRecorderOptions options = {});
+    // Without finish() the temporary file is removed.
+    ~SvfRecorder() override;
+    SvfRecorder(const SvfRecorder&) = delete;
+    SvfRecorder& operator=(const SvfRecorder&) = delete;
+
+    bool outputMode() override { return true; }
+    void comment(const char* text) override;
+    bool shift(int stage, RLBitVec* tdi, RLBitVec* tdiMask, RLBitVec* tdo, RLBitVec* tdoMask) override;
+    bool shiftWrite(int stage, RLBitVec* tdi, int reserved) override;
+    // Stages 2, 3 and 12 without an open transaction, unknown stages and a
+    // null tdi fail and record nothing. tdo is left as it came (the file
+    // captures nothing).
+    // Closes an open transaction; a non-zero time becomes a RUNTEST.
+    bool wait(int time, bool microseconds) override;
+    // True once requestCancel() was called, or when the file can no longer
+    // be written (nothing more could be recorded).
+    bool isCancelled(int level) override;
+
+    // Cancel from another thread or a signal handler: requestCancel(), or
+    // store true into cancelFlag() (lock-free).
+    void requestCancel() { cancelRequested_.store(true); }
+    void clearCancel() { cancelRequested_.store(false); }
+    std::atomic<bool>& cancelFlag() { return cancelRequested_; }
+
+    // Closes an open transaction, writes the rest and renames the file onto
+    // the target. Throws SvfError when the file could not be written
+    // completely; the target is then left untouched.
+    void finish();
+    bool finished() const { return finished_; }
+
+    const SvfRecorderTotals& totals() const { return totals_; }
+    const std::filesystem::path& target() const { return file_.target(); }
+
+    // Hex digits per line of a wrapped value.
+    static constexpr std::size_t kDigitsPerLine = 128;
+
+private:
+    bool usable() const { return !finished_ && !file_.failed(); }
+    void writeHeader(const SvfRecorderOptions& options);
+    void addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBitVec* tdoMask);
+    void closeTransaction();
+    void writeSdr();
+    void writeCommentLines(const char* text);
+    void flushIfFull();
+    void flushBuffer();
+
+    AtomicOutputFile file_;
+    std::string buffer_;
+    // The transaction being joined. tdo_ and mask_ are only kept once a
+    // shift of it has a mask bit set (compares_).
+    bool open_ = false;
+    bool compares_ = false;
+    BitBuffer tdi_, tdo_, mask_;
+    // Comments that arrive while a transaction is open follow its SDR.
+    std::string heldComments_;
+    std::atomic<bool> cancelRequested_{false};
+    bool finished_ = false;
+    SvfRecorderTotals totals_;
+};
+
+}  // namespace vorant::svf
