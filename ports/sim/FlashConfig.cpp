@@ -99,11 +99,14 @@ void applyStatusLabels(const PartReader& part, FlashConfig& config) {
         const std::string label = part.text(key.c_str());
         const bool reserved = label == "NOT_VALID";
         const auto mask = static_cast<std::uint8_t>(1u << (bit % 8));
+        // Bits the chip sets itself: a status write cannot change them.
+        const bool readOnly = label == "SUS" || label == "SUS1" || label == "SUS2" || label == "E_ERR" ||
+                              label == "P_ERR";
         if (bit < 8) {
-            if (label.size() == 3 && label[0] == 'B' && label[1] == 'P' && label[2] >= '0' && label[2] <= '3')
+            if (label.size() == 3 && label[0] == 'B' && label[1] == 'P' && label[2] >= '0' && label[2] <= '4')
                 blockProtect |= mask;
-            if (bit >= 2 && !reserved) writable1 |= mask;
-        } else if (!reserved && label != "SUS") {
+            if (bit >= 2 && !reserved && !readOnly) writable1 |= mask;
+        } else if (!reserved && !readOnly) {
             writable2 |= mask;
         }
     }
@@ -136,8 +139,13 @@ FlashConfig FlashConfig::fromPartDatabase(const std::string& partName) {
     config.opPageProgram = part.opcode("PAGEPROGRAM_INSTRUCTION");
     config.opSectorErase = part.opcode("SECTORERASE_INSTRUCTION");
     config.opBulkErase = part.opcode("BULKERASE_INSTRUCTION");
-    config.opDeepPowerDown = part.opcode("DEEPDOWN_INSTRUCTION");
-    config.opReleaseSignature = part.opcode("READSIGNATURE_INSTRUCTION");
+    // Part files write 00h for a command the chip does not have.
+    auto optionalOpcode = [&](const char* key) {
+        const int op = part.opcode(key);
+        return op == 0x00 ? -1 : op;
+    };
+    config.opDeepPowerDown = optionalOpcode("DEEPDOWN_INSTRUCTION");
+    config.opReleaseSignature = optionalOpcode("READSIGNATURE_INSTRUCTION");
 
     const bool usesRes = part.flag("USE_RES");
     // The JEDEC ID; a part without one known answers FF FF FF, as MISO
