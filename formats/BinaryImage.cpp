@@ -1,0 +1,28 @@
+#include "formats/BinaryImage.h"
+
+#include "formats/FormatError.h"
+#include "formats/InputFile.h"
+
+#include <vector>
+
+namespace vorant::formats {
+
+FlashImage readBinaryImage(const std::string& path) {
+    InputFile file = openInputFile(path);
+    if (file.size > FlashImage::kMaxBytes) {
+        throw FormatError(path + ": " + std::to_string(file.size) +
+                          " bytes is larger than the largest supported image (" +
+                          std::to_string(FlashImage::kMaxBytes) + " bytes)");
+    }
+    std::vector<unsigned char> bytes(static_cast<std::size_t>(file.size));
+    if (!bytes.empty()) {
+        file.stream.read(reinterpret_cast<char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
+        if (file.stream.gcount() != static_cast<std::streamsize>(bytes.size())) {
+            throw FormatError(path + ": read error after " + std::to_string(file.stream.gcount()) +
+                              " of " + std::to_string(bytes.size()) + " bytes");
+        }
+    }
+    return FlashImage(std::move(bytes));
+}
+
+}  // namespace vorant::formats

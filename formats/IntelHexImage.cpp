@@ -1,0 +1,198 @@
+#include "formats/IntelHexImage.h"
+
+#include "formats/AddressRanges.h"
+#include "formats/FormatError.h"
+#include "formats/InputFile.h"
+
+#include <cstdint>
+#include <cstdio>
+#include <cstring>
+#include <vector>
+
+namespace vorant::formats {
+namespace {
+
+enum RecordType : unsigned char {
+    kData = 0x00,
+    kEndOfFile = 0x01,
+    kExtendedSegmentAddress = 0x02,
+    kStartSegmentAddress = 0x03,
+    kExtendedLinearAddress = 0x04,
+    kStartLinearAddress = 0x05,
+};
+
+int hexDigitValue(char c) {
+    if (c >= '0' && c <= '9') return c - '0';
+    if (c >= 'A' && c <= 'F') return c - 'A' + 10;
+    if (c >= 'a' && c <= 'f') return c - 'a' + 10;
+    return -1;
+}
+
+std::string hexNumber(std::uint64_t value, int digits) {
+    char text[32];
+    std::snprintf(text, sizeof text, "0x%0*llX", digits, static_cast<unsigned long long>(value));
+    return text;
+}
+
+std::string describeCharacter(char c) {
+    const auto code = static_cast<unsigned char>(c);
+    if (code >= 0x21 && code < 0x7F) return std::string("'") + c + "'";
+    return "byte " + hexNumber(code, 2);
+}
+
+class IntelHexParser {
+public:
+    explicit IntelHexParser(const std::string& sourceName) : sourceName_(sourceName) {}
+
+    FlashImage parse(std::istream& in) {
+        std::string line;
+        while (std::getline(in, line)) {
+            ++lineNumber_;
+            parseLine(line);
+        }
+        if (in.bad()) throw FormatError(sourceName_ + ": read error after line " + std::to_string(lineNumber_));
+        if (!sawEndOfFile_) {
+            fail(lineNumber_, "the file ends without an end-of-file record (type 01)");
+        }
+        return FlashImage(std::move(image_));
+    }
+
+private:
+    [[noreturn]] void fail(std::size_t line, const std::string& reason) const {
+        throw FormatError(sourceName_ + ":" + std::to_string(line) + ": " + reason);
+    }
+
+    void parseLine(std::string& line) {
+        std::size_t length = line.size();
+        while (length > 0 && (line[length - 1] == '\r' || line[length - 1] == ' ' || line[length - 1] == '\t')) {
+            --length;
+        }
+        if (length == 0) return;
+        if (sawEndOfFile_) fail(lineNumber_, "record after the end-of-file record");
+        if (line[0] != ':') {
+            fail(lineNumber_, "a record starts with ':', this line starts with " + describeCharacter(line[0]));
+        }
+        decodeRecord(line.data() + 1, length - 1);
+        handleRecord();
+    }
+
+    void decodeRecord(const char* digits, std::size_t digitCount) {
+        if (digitCount % 2 != 0) {
+            fail(lineNumber_, "odd number of hex digits (" + std::to_string(digitCount) + ")");
+        }
+        record_.resize(digitCount / 2);
+        for (std::size_t i = 0; i < record_.size(); ++i) {
+            const int high = hexDigitValue(digits[2 * i]);
+            const int low = hexDigitValue(digits[2 * i + 1]);
+            if (high < 0 || low < 0) {
+                const std::size_t bad = high < 0 ? 2 * i : 2 * i + 1;
+                fail(lineNumber_, "bad hex digit " + describeCharacter(digits[bad]) + " at column " +
+                                      std::to_string(bad + 2));
+            }
+            record_[i] = static_cast<unsigned char>(high << 4 | low);
+        }
+        if (record_.size() < 5) {
+            fail(lineNumber_, "record too short: " + std::to_string(record_.size()) +
+                                  " bytes where count, address, type and checksum alone take 5");
+        }
+        const std::size_t declared = record_[0];
+        if (declared + 5 != record_.size()) {
+            fail(lineNumber_, "length mismatch: the byte count says " + std::to_string(declared) +
+                                  " data bytes, the line holds " + std::to_string(record_.size() - 5));
+        }
+        unsigned sum = 0;
+        for (std::size_t i = 0; i + 1 < record_.size(); ++i) sum += record_[i];
+        const unsigned expected = (0x100 - (sum & 0xFF)) & 0xFF;
+        if (record_.back() != expected) {
+            fail(lineNumber_, "checksum mismatch: the record says " + hexNumber(record_.back(), 2) +
+                                  ", its bytes need " + hexNumber(expected, 2));
+        }
+    }
+
+    void handleRecord() {
+        const unsigned char count = record_[0];
+        const unsigned offset = static_cast<unsigned>(record_[1]) << 8 | record_[2];
+        const unsigned char type = record_[3];
+        const unsigned char* payload = record_.data() + 4;
+        switch (type) {
+        case kData:
+            placeData(offset, payload, count);
+            break;
+        case kEndOfFile:
+            requireCount(count, 0, "an end-of-file record");
+            sawEndOfFile_ = true;
+            break;
+        case kExtendedSegmentAddress:
+            requireCount(count, 2, "an extended segment address record");
+            base_ = static_cast<std::uint64_t>(payload[0] << 8 | payload[1]) << 4;
+            segmented_ = true;
+            break;
+        case kExtendedLinearAddress:
+            requireCount(count, 2, "an extended linear address record");
+            base_ = static_cast<std::uint64_t>(payload[0] << 8 | payload[1]) << 16;
+            segmented_ = false;
+            break;
+        case kStartSegmentAddress:
+        case kStartLinearAddress:
+            break;  // an execution start address means nothing to a flash image
+        default:
+            fail(lineNumber_, "unknown record type " + hexNumber(type, 2));
+        }
+    }
+
+    void requireCount(unsigned count, unsigned wanted, const char* what) const {
+        if (count != wanted) {
+            fail(lineNumber_, std::string(what) + " carries " + std::to_string(wanted) + " data bytes, not " +
+                                  std::to_string(count));
+        }
+    }
+
+    void placeData(unsigned offset, const unsigned char* data, std::size_t count) {
+        if (segmented_ && offset + count > 0x10000) {
+            // The offset wraps inside the segment.
+            const std::size_t first = 0x10000 - offset;
+            placeRun(base_ + offset, data, first);
+            placeRun(base_, data + first, count - first);
+        } else {
+            placeRun(base_ + offset, data, count);
+        }
+    }
+
+    void placeRun(std::uint64_t start, const unsigned char* data, std::size_t count) {
+        if (count == 0) return;
+        const std::uint64_t end = start + count;
+        if (end > FlashImage::kMaxBytes) {
+            fail(lineNumber_, "data at " + hexNumber(start, 8) + " reach past " +
+                                  hexNumber(FlashImage::kMaxBytes, 8) + ", the end of the largest supported image");
+        }
+        if (covered_.overlaps(start, end)) {
+            fail(lineNumber_, "data at " + hexNumber(start, 8) + ".." + hexNumber(end - 1, 8) +
+                                  " overlap data of an earlier record");
+        }
+        covered_.add(start, end);
+        if (image_.size() < end) image_.resize(static_cast<std::size_t>(end), 0xFF);
+        std::memcpy(image_.data() + start, data, count);
+    }
+
+    const std::string sourceName_;
+    std::size_t lineNumber_ = 0;
+    bool sawEndOfFile_ = false;
+    bool segmented_ = false;
+    std::uint64_t base_ = 0;
+    std::vector<unsigned char> record_;
+    std::vector<unsigned char> image_;
+    AddressRanges covered_;
+};
+
+}  // namespace
+
+FlashImage parseIntelHex(std::istream& in, const std::string& sourceName) {
+    return IntelHexParser(sourceName).parse(in);
+}
+
+FlashImage readIntelHexImage(const std::string& path) {
+    InputFile file = openInputFile(path);
+    return parseIntelHex(file.stream, path);
+}
+
+}  // namespace vorant::formats

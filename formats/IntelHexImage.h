@@ -1,0 +1,34 @@
+#pragma once
+#include "formats/FlashImage.h"
+
+#include <istream>
+#include <string>
+
+namespace vorant::formats {
+
+// Intel HEX (.hex, .mcs) into an image laid out from flash address 0.
+//
+// Records taken: 00 data, 01 end of file, 02 extended segment address,
+// 04 extended linear address; 03 and 05 (start addresses) are accepted and
+// ignored. Every record's checksum is enforced. Data after an 02 record wrap
+// inside their 64 KiB segment; after an 04 record (or none) they run on
+// linearly. Holes, and the space below the first record, read 0xFF.
+//
+// Blank lines and trailing white space (CR of CRLF files included) are
+// ignored. Errors, each a FormatError "<file>:<line>: <reason>":
+//   - a line that does not start with ':'
+//   - an odd number of hex digits, or a character that is not a hex digit
+//   - a record shorter than its five fixed bytes
+//   - a byte count that disagrees with the digits on the line
+//   - a checksum mismatch
+//   - an unknown record type, or an 01/02/04 record of the wrong length
+//   - a record after the end-of-file record
+//   - data overlapping data of an earlier record
+//   - data reaching past FlashImage::kMaxBytes
+//   - a file that ends without an end-of-file record (names its last line)
+FlashImage readIntelHexImage(const std::string& path);
+
+// The same from a stream; sourceName stands for the file in messages.
+FlashImage parseIntelHex(std::istream& in, const std::string& sourceName);
+
+}  // namespace vorant::formats

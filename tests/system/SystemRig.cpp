@@ -1,0 +1,85 @@
+#include "tests/system/SystemRig.h"
+
+#include "formats/ConfigDataFiles.h"
+#include "host/ConstraintsManager.h"
+#include "tests/support/TestParts.h"
+
+#include <mutex>
+#include <random>
+
+namespace vorant::test {
+
+std::vector<unsigned char> randomImage(std::size_t bytes, std::uint32_t seed) {
+    std::mt19937 generator(seed);
+    std::vector<unsigned char> image(bytes);
+    for (auto& b : image) b = static_cast<unsigned char>(generator() & 0xFFu);
+    return image;
+}
+
+std::uint32_t referenceCrc32(const std::vector<unsigned char>& bytes) {
+    std::uint32_t crc = 0xFFFFFFFFu;
+    for (unsigned char byte : bytes) {
+        crc ^= byte;
+        for (int k = 0; k < 8; ++k) crc = (crc >> 1) ^ ((crc & 1u) ? 0xEDB88320u : 0u);
+    }
+    return ~crc;
+}
+
+std::uint8_t firstWireByte(const RLBitVec& vector) {
+    std::uint8_t value = 0;
+    for (std::size_t i = 0; i < 8 && i < vector.length(); ++i)
+        value = static_cast<std::uint8_t>(value | (((vector.data()[i / 8] >> (i % 8)) & 1u) << (7 - i)));
+    return value;
+}
+
+CountingPort::CountingPort(ScanPort& inner, std::uint8_t pageProgramOpcode, std::uint8_t writeDisableOpcode)
+    : inner_(inner), pageProgramOpcode_(pageProgramOpcode), writeDisableOpcode_(writeDisableOpcode) {}
+
+bool CountingPort::shift(int stage, RLBitVec* tdi, RLBitVec* tdiMask, RLBitVec* tdo, RLBitVec* tdoMask) {
+    if (stage == 0 && tdi && tdi->length() > 8 && firstWireByte(*tdi) == pageProgramOpcode_) ++pagesProgrammed;
+    return inner_.shift(stage, tdi, tdiMask, tdo, tdoMask);
+}
+
+bool CountingPort::shiftWrite(int stage, RLBitVec* tdi, int reserved) {
+    if (tdi) lastWriteOpcode = firstWireByte(*tdi);
+    (void)writeDisableOpcode_;
+    return inner_.shiftWrite(stage, tdi, reserved);
+}
+
+bool CountingPort::isCancelled(int level) {
+    const bool inner = inner_.isCancelled(level);
+    return inner || (cancelAfterPages >= 0 && pagesProgrammed >= cancelAfterPages);
+}
+
+void loadShippedPartsOnce() {
+    static std::once_flag once;
+    std::call_once(once, [] {
+        loadShippedParts();
+        formats::registerStandardFormats();
+    });
+}
+
+SystemRig::SystemRig(const std::string& partName, sim::FaultPlan faults) : part(partName) {
+    loadShippedPartsOnce();
+    port = std::make_unique<sim::SimScanPort>(sim::FlashConfig::fromPartDatabase(part), std::move(faults));
+    device = create_type1_spi_device(part.c_str());
+    device->setScanPort(port.get());
+}
+
+SystemRig::~SystemRig() {
+    DeviceOperation* base = device;
+    delete base;
+}
+
+void SystemRig::useImage(std::vector<unsigned char> bytes) {
+    image = std::make_unique<formats::FlashImage>(std::move(bytes));
+    device->setConfigData(image.get());
+}
+
+bool SystemRig::run(const std::function<bool(Type1SPIDevice&, UT_CMDARGS*)>& operation,
+                    const std::vector<std::string>& switches) {
+    UT_CMDARGS args(switches);
+    return operation(*device, &args);
+}
+
+}  // namespace vorant::test

@@ -1,0 +1,70 @@
+#pragma once
+// A device of the shipped part database wired to a simulated flash, the way
+// a host wires it: created through the factory, driven through its virtual
+// operations.
+
+#include "formats/FlashImage.h"
+#include "host/MessageSinks.h"
+#include "host/UT_CMDARGS.h"
+#include "ports/sim/SimScanPort.h"
+#include "s/Type1SPIDevice.h"
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace vorant::test {
+
+// Deterministic pseudo-random bytes.
+std::vector<unsigned char> randomImage(std::size_t bytes, std::uint32_t seed);
+
+// CRC-32 computed bit by bit, independent of every CRC in the project.
+std::uint32_t referenceCrc32(const std::vector<unsigned char>& bytes);
+
+// Forwards every call to a port and counts page programs (stage-0 shifts
+// whose first byte is the page-program opcode) and write disables; can ask
+// the port to cancel after a number of pages.
+class CountingPort : public ScanPort {
+public:
+    CountingPort(ScanPort& inner, std::uint8_t pageProgramOpcode, std::uint8_t writeDisableOpcode);
+    bool outputMode() override { return inner_.outputMode(); }
+    void comment(const char* text) override { inner_.comment(text); }
+    bool shift(int stage, RLBitVec* tdi, RLBitVec* tdiMask, RLBitVec* tdo, RLBitVec* tdoMask) override;
+    bool shiftWrite(int stage, RLBitVec* tdi, int reserved) override;
+    bool wait(int time, bool microseconds) override { return inner_.wait(time, microseconds); }
+    bool isCancelled(int level) override;
+
+    int pagesProgrammed = 0;
+    int cancelAfterPages = -1;
+    std::uint8_t lastWriteOpcode = 0;  // first byte of the last shiftWrite
+
+private:
+    ScanPort& inner_;
+    std::uint8_t pageProgramOpcode_, writeDisableOpcode_;
+};
+
+// The first byte of a vector as it goes on the wire.
+std::uint8_t firstWireByte(const RLBitVec& vector);
+
+struct SystemRig {
+    explicit SystemRig(const std::string& part, sim::FaultPlan faults = {});
+    ~SystemRig();
+
+    bool run(const std::function<bool(Type1SPIDevice&, UT_CMDARGS*)>& operation,
+             const std::vector<std::string>& switches = {});
+    void useImage(std::vector<unsigned char> bytes);
+
+    std::string part;
+    std::unique_ptr<sim::SimScanPort> port;
+    std::unique_ptr<formats::FlashImage> image;
+    Type1SPIDevice* device = nullptr;
+    CapturingSink messages;
+    ScopedSink sinkScope{&messages};
+};
+
+// Loads the shipped part files once per test program.
+void loadShippedPartsOnce();
+
+}  // namespace vorant::test
