@@ -3,6 +3,7 @@
 // ("TRUE"/"FALSE"), set only when the check reached one.
 
 #include "s/DeviceMessages.h"
+#include "s/ReadCommandFrame.h"
 #include "s/Type1SPIDevice.h"
 
 #include "host/ScanPort.h"
@@ -21,13 +22,8 @@ bool Type1SPIDevice::blankCheck(int index, UT_CMDARGS* args) {
 
     bool result = spienable(index, args);
 
-    const std::size_t readBits = static_cast<std::size_t>(readSize_);
     const std::size_t pageBits = static_cast<std::size_t>(pageSize_);
-    RLBitVec readFrame(readBits, false);
-    readFrame.updateBitField(readInstruction_.c_str(), 0);
-    RLBitVec readTdiMask(readBits, true);
-    RLBitVec readTdo(readBits, false);
-    RLBitVec readTdoMask(readBits, false);
+    vorant::device::ReadCommandFrame readCommand(readInstruction_, readSize_, pageAddressStartIndex_, addressSize_);
     // Ones go out and are expected back. The loop only goes on after an
     // all-ones page, so the vector is all ones again at every read.
     RLBitVec capture(pageBits, true);
@@ -43,9 +39,7 @@ bool Type1SPIDevice::blankCheck(int index, UT_CMDARGS* args) {
     if (deviceSize_ > 0) {
         do {
             bitsRead += pageSize_;
-            readFrame.updateBitField(address, pageAddressStartIndex_, addressSize_, true);
-            port().comment("//Loading device with 'read' instruction.\n");
-            result &= port().shift(ScanStage::kOpen, &readFrame, &readTdiMask, &readTdo, &readTdoMask);
+            result &= readCommand.open(port(), address, "//Loading device with 'read' instruction.\n");
             result &= port().shift(ScanStage::kCaptureClose, &capture, &pageOnes, &capture, &pageOnes);
             if (capture.uniformValue() != 0xFFFFFFFFu) {
                 blank = false;

@@ -3,6 +3,7 @@
 // handed over as captured; the writer puts each byte back in flash order.
 
 #include "s/DeviceMessages.h"
+#include "s/ReadCommandFrame.h"
 #include "s/Type1SPIDevice.h"
 
 #include "host/ConfigData.h"
@@ -59,13 +60,8 @@ bool Type1SPIDevice::readbackToFile(int index, UT_CMDARGS* args) {
 
     bool result = spienable(index, args);
 
-    const std::size_t readBits = static_cast<std::size_t>(readSize_);
     const std::size_t pageBits = static_cast<std::size_t>(pageSize_);
-    RLBitVec readFrame(readBits, false);
-    readFrame.updateBitField(readInstruction_.c_str(), 0);
-    RLBitVec readTdiMask(readBits, true);
-    RLBitVec readTdo(readBits, false);
-    RLBitVec readTdoMask(readBits, false);
+    vorant::device::ReadCommandFrame readCommand(readInstruction_, readSize_, pageAddressStartIndex_, addressSize_);
     // Also the data sent out: each page's read shifts out the page before it
     // (zeros for the first), which the flash ignores.
     RLBitVec capture(pageBits, false);
@@ -84,9 +80,7 @@ bool Type1SPIDevice::readbackToFile(int index, UT_CMDARGS* args) {
         // The last page is read whole even when it reaches past DEVICE_SIZE.
         do {
             bitsCovered += pageSize_;
-            readFrame.updateBitField(address, pageAddressStartIndex_, addressSize_, true);
-            port().comment("//Loading device with 'read' instruction.\n");
-            result &= port().shift(ScanStage::kOpen, &readFrame, &readTdiMask, &readTdo, &readTdoMask);
+            result &= readCommand.open(port(), address, "//Loading device with 'read' instruction.\n");
             result &= port().shift(ScanStage::kCaptureClose, &capture, &pageOnes, &capture, &pageOnes);
             written &= writer->writeData(capture.data(), fileOffset, captureBits, 0);
             fileOffset += addressStep;

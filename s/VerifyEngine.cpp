@@ -4,6 +4,7 @@
 // difference; checksum feeds both to the host's checksum accumulator.
 
 #include "s/DeviceMessages.h"
+#include "s/ReadCommandFrame.h"
 #include "s/Type1SPIDevice.h"
 
 #include "host/ConfigData.h"
@@ -46,18 +47,13 @@ bool Type1SPIDevice::verify(int index, UT_CMDARGS* args, const char* operation) 
         return false;
     }
 
-    const std::size_t readBits = static_cast<std::size_t>(readSize_);
     const std::size_t pageBits = static_cast<std::size_t>(pageSize_);
-    RLBitVec readFrame(readBits, false);
-    RLBitVec readTdiMask(readBits, true);
-    RLBitVec readTdo(readBits, false);
-    RLBitVec readTdoMask(readBits, false);
+    vorant::device::ReadCommandFrame readCommand(readInstruction_, readSize_, pageAddressStartIndex_, addressSize_);
     RLBitVec dataTdiMask(pageBits, true);
     RLBitVec dataTdoMask(pageBits, true);
 
     DEVICE_MESSAGE().issueStatus("'%d': Reading device contents...\n", index);
     reader->rewind();
-    readFrame.updateBitField(readInstruction_.c_str(), 0);
 
     // The last pair lives to the end: the final checksum call gets it.
     std::unique_ptr<RLBitVec> reference;
@@ -79,9 +75,7 @@ bool Type1SPIDevice::verify(int index, UT_CMDARGS* args, const char* operation) 
         reference = std::make_unique<RLBitVec>(bytes, static_cast<std::size_t>(delivered));
         capture = std::make_unique<RLBitVec>(bytes, static_cast<std::size_t>(delivered));
 
-        readFrame.updateBitField(address, pageAddressStartIndex_, addressSize_, true);
-        port().comment("//Loading device with 'read ' instruction.\n");
-        result &= port().shift(ScanStage::kOpen, &readFrame, &readTdiMask, &readTdo, &readTdoMask);
+        result &= readCommand.open(port(), address, "//Loading device with 'read ' instruction.\n");
         result &= port().shift(ScanStage::kCaptureClose, capture.get(), &dataTdiMask, capture.get(),
                                &dataTdoMask);
         address += static_cast<unsigned>(addressStep);
