@@ -1,4 +1,3 @@
-#include "host/ConfigData.h"
 #include "host/Device.h"
 #include "host/MessageSinks.h"
 #include "host/VorantException.h"
@@ -19,15 +18,6 @@ TEST_F(DeviceBase, UnknownPartsCannotBeDevices) {
     EXPECT_THROW(SPIDevice("NO-SUCH-PART"), VorantException);
 }
 
-TEST_F(DeviceBase, AttributesAreCopiedTexts) {
-    SPIDevice device("BASEPART");
-    std::string text = "TRUE";
-    device.setAttribute(DeviceNS::ATTR_BLANK, text.c_str(), true);
-    text = "XXXX";
-    EXPECT_STREQ(device.getAttribute(DeviceNS::ATTR_BLANK), "TRUE");
-    EXPECT_EQ(device.getAttribute(DeviceNS::ATTR_DATA_WIDTH), nullptr);
-}
-
 TEST_F(DeviceBase, UnsupportedOperationsSayItAndFail) {
     vorant::CapturingSink sink;
     vorant::ScopedSink scope(&sink);
@@ -44,13 +34,6 @@ TEST_F(DeviceBase, WithoutAPortEveryTransferFailsAndCancelStopsLoops) {
     RLBitVec v(8, false);
     EXPECT_FALSE(device.getScanPort()->shift(0, &v, &v, &v, &v));
     EXPECT_TRUE(device.getScanPort()->isCancelled(2));
-}
-
-TEST_F(DeviceBase, SwapBitsReversesTheByte) {
-    EXPECT_EQ(SPIDevice::swapBits(0x01), 0x80);
-    EXPECT_EQ(SPIDevice::swapBits(0x40), 0x02);
-    EXPECT_EQ(SPIDevice::swapBits(0xA5), 0xA5);
-    EXPECT_EQ(SPIDevice::swapBits(0x0F), 0xF0);
 }
 
 TEST_F(DeviceBase, RowChecksumIsCrc32OfTheBytesInFlashOrder) {
@@ -72,29 +55,6 @@ TEST_F(DeviceBase, RowChecksumIsCrc32OfTheBytesInFlashOrder) {
     EXPECT_EQ(sink.texts(MessageKind::Error), std::vector<std::string>{"'0': Checksums differ.\n"});
     int empty1 = 0, empty2 = 0;
     EXPECT_TRUE(device.rowChecksum(0, nullptr, 0, nullptr, 0, true, empty1, empty2, 0, 0));
-}
-
-class NamedWriter : public ConfigDataWriter {
-public:
-    explicit NamedWriter(std::string name) : name(std::move(name)) {}
-    bool beginWrite() override { return true; }
-    bool writeData(const unsigned char*, int, int, int) override { return true; }
-    bool endWrite() override { return true; }
-    std::string name;
-};
-
-TEST_F(DeviceBase, WritersArePickedByExtension) {
-    ConfigDataWriter::registerFormat(".tst", [](const std::string& file) {
-        return std::make_unique<NamedWriter>("tst:" + file);
-    });
-    ConfigDataWriter::registerFormat(".bad", [](const std::string&) -> std::unique_ptr<ConfigDataWriter> {
-        throw std::runtime_error("cannot open");
-    });
-    std::unique_ptr<ConfigDataWriter> writer(ConfigDataWriter::CreateWriter("out.TST", "BASEPART", nullptr));
-    ASSERT_NE(writer, nullptr);
-    EXPECT_EQ(static_cast<NamedWriter*>(writer.get())->name, "tst:out.TST");
-    EXPECT_EQ(ConfigDataWriter::CreateWriter("out.bad", "BASEPART", nullptr), nullptr);
-    EXPECT_EQ(ConfigDataWriter::CreateWriter("", "BASEPART", nullptr), nullptr);
 }
 
 }  // namespace

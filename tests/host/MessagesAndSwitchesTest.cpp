@@ -58,12 +58,6 @@ TEST(Messages, ConsoleSinkLabelsInfoAndErrorsAndHidesDebugUnlessAsked) {
     }
 }
 
-TEST(Messages, WithoutASinkMessagesAreDropped) {
-    vorant::ScopedSink none(nullptr);
-    Port_MsgManData::createObject("Vorant", "s", 1, "r").issueStatus("nobody hears this\n");
-    SUCCEED();
-}
-
 TEST(Switches, TokensBecomeSwitchesWithTheirArguments) {
     UT_CMDARGS args({"image.bin", "-e", "-f", "out.bin", "extra", "-v", "-file", "second.bin", "-", "-qebit"});
     EXPECT_EQ(args.positional(), std::vector<std::string>{"image.bin"});

@@ -31,28 +31,11 @@ TEST(TextServices, IMatchIsACaseInsensitiveWildcardMatch) {
             << (c.text ? c.text : "(null)") << " ~ " << c.pattern;
 }
 
-TEST(TextServices, DupGivesAStablePooledCopy) {
-    std::string name = "readback.bin";
-    char* copy = UT_STR::Dup(name.c_str());
-    name[0] = 'X';
-    EXPECT_STREQ(copy, "readback.bin");
-}
-
 TEST(TextServices, GetEnvAnswersNullForUndefinedVariables) {
     ::setenv("VORANT_TEST_VARIABLE", "", 1);
     ASSERT_NE(Port_Env::GetEnv("VORANT_TEST_VARIABLE"), nullptr) << "defined but empty still counts";
     ::unsetenv("VORANT_TEST_VARIABLE");
     EXPECT_EQ(Port_Env::GetEnv("VORANT_TEST_VARIABLE"), nullptr);
-}
-
-TEST(TextServices, StringFormatting) {
-    Port::StringBase<char> key;
-    key.doFormat("STATUS_LOCATION_%d", 15);
-    EXPECT_STREQ(key.c_str(), "STATUS_LOCATION_15");
-    Port::StringBase<char> copy = key;
-    key = "other";
-    EXPECT_STREQ(copy.c_str(), "STATUS_LOCATION_15");
-    EXPECT_EQ(Port::StringBase<char>(nullptr).length(), 0u);
 }
 
 }  // namespace
