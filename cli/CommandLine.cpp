@@ -1,0 +1,219 @@
+#include "cli/CommandLine.h"
+
+#include "cli/SimFaultOption.h"
+#include "cli/UsageError.h"
+#include "host/UT_STR.h"
+
+#include <CLI/CLI.hpp>
+
+#include <algorithm>
+#include <cstdint>
+#include <limits>
+#include <sstream>
+
+namespace vorant::cli {
+
+namespace {
+
+constexpr long long kMaxIndex = 9999;
+constexpr long long kMaxClockHz = 1'000'000'000;
+constexpr const char* kHelpHint = "run 'vorant-spi --help' for the options and operations";
+
+std::string operationsHelp() {
+    std::ostringstream text;
+    text << "Operations:\n";
+    for (const OperationInfo& info : operationCatalog())
+        text << "  " << info.synopsis << "\n      " << info.purpose << "\n";
+    text << "\nPorts (--port):\n"
+            "  sim          a simulated chip, erased at every start (the default)\n"
+            "  sim:FILE     a simulated chip whose memory and status registers live in FILE\n"
+            "  svf:FILE     record the scans as SVF into FILE; the file appears only when the\n"
+            "               operation succeeds (a failed or cancelled run leaves no file and\n"
+            "               leaves an existing FILE untouched)\n"
+            "\nPart database:\n"
+            "  The shipped part files are loaded from the first folder that exists of\n"
+            "    1. $VORANT_PARTS_DIR (when set, it must be a folder),\n"
+            "    2. the folder 'parts' beside the vorant-spi executable,\n"
+            "    3. the source tree's parts folder it was built from,\n"
+            "  then every --parts FILE, in order (a later part of the same name wins).\n"
+            "  --part auto reads the JEDEC ID and picks the one part that has it; the\n"
+            "  simulator then plays --chip, by default "
+         << kDefaultSimulatedChip
+         << ".\n"
+            "\nExit status:\n"
+            "  0  the operation succeeded (blankcheck: the flash is blank)\n"
+            "  1  the operation failed, the flash is not blank, a played file mismatched,\n"
+            "     or the run was cancelled (Ctrl-C; press it twice to quit at once)\n"
+            "  2  usage error: bad option, file, part or value; nothing was done\n"
+            "\nExamples:\n"
+            "  vorant-spi --port sim:flash.bin program image.bin -e -v\n"
+            "  vorant-spi --port sim:flash.bin readback -f out.bin\n"
+            "  vorant-spi --part W25Q64JV --port svf:job.svf program image.mcs -e -v\n"
+            "  vorant-spi --part W25Q64JV play job.svf\n";
+    return text.str();
+}
+
+// The usage line names the operation, which CLI11 does not know about.
+class HelpFormatter : public CLI::Formatter {
+public:
+    std::string make_usage(const CLI::App*, std::string) const override {
+        return "\nUsage: vorant-spi [options] OPERATION [operands and switches] [options]\n";
+    }
+};
+
+struct ParsedValues {
+    std::string part = "auto";
+    std::string port = "sim";
+    std::string chip;
+    std::vector<std::string> partFiles;
+    long long index = 0;
+    long long dataWidth = 0;
+    long long clockHz = 0;
+    bool dataWidthGiven = false, clockGiven = false;
+    bool debug = false, quiet = false, version = false;
+    std::vector<std::string> simFaults;
+};
+
+void defineOptions(CLI::App& app, ParsedValues& values) {
+    app.set_help_flag("-h,--help", "Show this help and exit");
+    app.add_flag("--version", values.version, "Show the version and exit");
+    app.add_option("--part", values.part,
+                   "The flash part, or 'auto' to identify it by its JEDEC ID (default: auto; the SVF port "
+                   "needs a name)")
+        ->type_name("NAME|auto");
+    app.add_option("--port", values.port, "Where the scans go: sim, sim:FILE or svf:FILE (default: sim)")
+        ->type_name("PORT");
+    app.add_option("--chip", values.chip,
+                   "The part the simulator plays (default: --part, or " + std::string(kDefaultSimulatedChip) +
+                       " with --part auto)")
+        ->type_name("NAME");
+    app.add_option("--parts", values.partFiles, "Load extra part files after the shipped ones (repeatable)")
+        ->type_name("FILE")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    app.add_option("--index", values.index, "The device's position, as shown in messages (default: 0)")
+        ->type_name("N");
+    app.add_option("--data-width", values.dataWidth,
+                   "Data width the flash is read with afterwards: 4 leaves Quad Enable set where the part "
+                   "supports it (default: 1)")
+        ->type_name("1|4");
+    app.add_option("--clock", values.clockHz, "SPI clock of the simulator in Hz (default: 50000000)")
+        ->type_name("HZ");
+    app.add_flag("--debug", values.debug, "Show debug traces");
+    app.add_flag("--quiet", values.quiet, "Show only errors: no status lines, progress or summary");
+    // For tests and demonstrations: faults the simulated chip injects.
+    app.add_option("--sim-fault", values.simFaults, "")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll)
+        ->group("");
+}
+
+// Whether `token` is an option that takes its value from the next token.
+bool consumesNextToken(CLI::App& app, const std::string& token) {
+    if (token.find('=') != std::string::npos) return false;
+    const CLI::Option* option = app.get_option_no_throw(token);
+    return option != nullptr && option->get_items_expected_min() > 0;
+}
+
+bool isLongOption(const std::string& token) { return token.size() > 2 && token.compare(0, 2, "--") == 0; }
+
+struct SplitArguments {
+    std::vector<std::string> global;
+    std::string operation;
+    std::vector<std::string> operationTokens;
+};
+
+// Options before the operation are the tool's; after it, long options are
+// still the tool's and everything else belongs to the operation.
+SplitArguments splitArguments(CLI::App& app, const std::vector<std::string>& arguments) {
+    SplitArguments split;
+    bool operationSeen = false;
+    for (std::size_t i = 0; i < arguments.size(); ++i) {
+        const std::string& token = arguments[i];
+        const bool global = operationSeen ? isLongOption(token) : (token.size() > 1 && token[0] == '-');
+        if (global) {
+            split.global.push_back(token);
+            if (consumesNextToken(app, token) && i + 1 < arguments.size()) split.global.push_back(arguments[++i]);
+        } else if (!operationSeen) {
+            split.operation = token;
+            operationSeen = true;
+        } else {
+            split.operationTokens.push_back(token);
+        }
+    }
+    return split;
+}
+
+ToolOptions toolOptions(const ParsedValues& values) {
+    ToolOptions options;
+    options.part = values.part;
+    if (options.part.empty()) throw UsageError("--part needs a part name or 'auto'");
+    if (UT_STR::ICompare(options.part.c_str(), "auto") == 0) options.part = "auto";
+    options.port = parsePortChoice(values.port);
+    if (!values.chip.empty()) options.chip = values.chip;
+    options.partFiles = values.partFiles;
+    if (values.index < 0 || values.index > kMaxIndex)
+        throw UsageError("--index " + std::to_string(values.index) + " is out of range; give 0 to " +
+                         std::to_string(kMaxIndex));
+    options.index = static_cast<int>(values.index);
+    if (values.dataWidthGiven) {
+        if (values.dataWidth != 1 && values.dataWidth != 4)
+            throw UsageError("--data-width " + std::to_string(values.dataWidth) + " is not supported; give 1 or 4");
+        options.dataWidth = static_cast<int>(values.dataWidth);
+    }
+    if (values.clockGiven) {
+        if (values.clockHz < 1 || values.clockHz > kMaxClockHz)
+            throw UsageError("--clock " + std::to_string(values.clockHz) + " is out of range; give 1 to " +
+                             std::to_string(kMaxClockHz) + " Hz");
+        options.clockHz = static_cast<std::uint32_t>(values.clockHz);
+    }
+    options.debug = values.debug;
+    options.quiet = values.quiet;
+    options.simFaults = values.simFaults;
+    // Checked now so a bad fault is a usage error before anything runs.
+    simFaultPlan(options.simFaults);
+    return options;
+}
+
+}  // namespace
+
+std::string versionText() { return std::string("vorant-spi ") + VORANT_TOOL_VERSION; }
+
+CommandLine parseCommandLine(const std::vector<std::string>& arguments) {
+    CLI::App app{"vorant-spi: programs SPI NOR flash through the Type 1 SPI device plug-in.", "vorant-spi"};
+    app.formatter(std::make_shared<HelpFormatter>());
+    ParsedValues values;
+    defineOptions(app, values);
+    app.footer(operationsHelp());
+
+    CommandLine result;
+    const SplitArguments split = splitArguments(app, arguments);
+    try {
+        std::vector<std::string> reversed(split.global.rbegin(), split.global.rend());
+        app.parse(reversed);
+    } catch (const CLI::CallForHelp&) {
+        result.action = CommandLine::Action::ShowHelp;
+        result.helpText = app.help();
+        return result;
+    } catch (const CLI::ParseError& error) {
+        std::string message = error.what();
+        while (!message.empty() && (message.back() == '\n' || message.back() == ' ')) message.pop_back();
+        throw UsageError(message + "; " + kHelpHint);
+    }
+    values.dataWidthGiven = app.count("--data-width") > 0;
+    values.clockGiven = app.count("--clock") > 0;
+    if (values.version) {
+        result.action = CommandLine::Action::ShowVersion;
+        return result;
+    }
+    if (split.operation.empty()) throw UsageError(std::string("no operation given; ") + kHelpHint);
+    const OperationInfo* info = findOperation(split.operation);
+    if (info == nullptr)
+        throw UsageError("unknown operation '" + split.operation + "'; the operations are " + operationNames());
+
+    result.options = toolOptions(values);
+    result.request = parseOperationTokens(*info, split.operationTokens);
+    return result;
+}
+
+}  // namespace vorant::cli

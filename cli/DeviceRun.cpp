@@ -1,0 +1,303 @@
+#include "cli/DeviceRun.h"
+
+#include "cli/CancelSignal.h"
+#include "cli/ImageCheck.h"
+#include "cli/InstructionOpcode.h"
+#include "cli/PartIdentification.h"
+#include "cli/PortSession.h"
+#include "cli/ProgressAwareSink.h"
+#include "cli/ProgressDisplay.h"
+#include "cli/ProgressPort.h"
+#include "cli/RunSummary.h"
+#include "cli/SameFile.h"
+#include "cli/SvfPlayback.h"
+#include "cli/Terminal.h"
+#include "cli/Tool.h"
+#include "cli/ToolMessages.h"
+#include "cli/UsageError.h"
+#include "formats/ConfigDataFiles.h"
+#include "formats/FixedWidthCif.h"
+#include "host/ConstraintsManager.h"
+#include "host/UT_STR.h"
+#include "host/VorantException.h"
+#include "ports/svf/SvfError.h"
+#include "s/Type1SPIDevice.h"
+
+#include <algorithm>
+#include <chrono>
+#include <cstdio>
+#include <memory>
+#include <optional>
+
+namespace vorant::cli {
+
+namespace {
+
+void checkPortFitsRequest(const ToolOptions& options, const OperationInfo& info) {
+    if (options.port.isSimulator()) return;
+    if (options.autoPart())
+        throw UsageError("the SVF port has no chip to identify; name the part with --part NAME");
+    if (options.chip) throw UsageError("--chip names the simulated chip and does not apply to --port svf");
+    if (options.clockHz) throw UsageError("--clock sets the simulator's clock and does not apply to --port svf");
+    if (!options.simFaults.empty()) throw UsageError("--sim-fault applies to the simulator only");
+    if (!info.recordable)
+        throw UsageError("'" + std::string(info.name) +
+                         "' answers from what it reads, and a recording reads nothing; run it with --port sim");
+}
+
+// The port's own file must not double as the operation's file: a readback
+// would replace the simulated flash's backing file under it, and a
+// recording would replace the image it was made from.
+void checkFilesApart(const ToolOptions& options, const OperationInfo& info, const std::string& file) {
+    if (file.empty() || options.port.file.empty() || !sameFile(file, options.port.file)) return;
+    if (info.operation == Operation::Readback)
+        throw UsageError("the readback file " + file + " is the simulated flash's own file; choose another name");
+    if (!options.port.isSimulator())
+        throw UsageError("the recording " + options.port.file + " would replace the image " + file +
+                         "; record into another file");
+}
+
+void checkPartKnown(const std::string& name, const char* what) {
+    if (!ConstraintsManager::instance().hasPart(name))
+        throw UsageError(std::string("unknown ") + what + " '" + name +
+                         "'; 'vorant-spi parts' lists the known parts, --parts FILE adds your own");
+}
+
+std::unique_ptr<Type1SPIDevice> createDevice(const std::string& partName) {
+    try {
+        std::unique_ptr<Type1SPIDevice> device(create_type1_spi_device(partName.c_str()));
+        if (!device) throw std::runtime_error("out of memory creating the device for " + partName);
+        return device;
+    } catch (const VorantException& error) {
+        throw UsageError("part " + partName + " cannot be used: " + error.what() + "; fix its part file");
+    }
+}
+
+std::optional<unsigned char> partOpcode(const std::string& part, const char* key) {
+    ConstraintsManager& database = ConstraintsManager::instance();
+    if (!database.hasProperty(part, key)) return std::nullopt;
+    return opcodeOfInstruction(database.getDeviceStringProperty(part.c_str(), key));
+}
+
+long long partNumber(const std::string& part, const char* key) {
+    ConstraintsManager& database = ConstraintsManager::instance();
+    if (!database.hasProperty(part, key)) return 0;
+    try {
+        return database.getDeviceLongProperty(part.c_str(), key);
+    } catch (const VorantException&) {
+        return 0;
+    }
+}
+
+ProgressPlan progressPlan(Type1SPIDevice& device, const OperationInfo& info, UT_CMDARGS& args,
+                          const std::string& part, ConfigDataReader* image) {
+    ProgressPlan plan;
+    plan.pageProgramOpcode = partOpcode(part, "PAGEPROGRAM_INSTRUCTION");
+    plan.readOpcode = partOpcode(part, "READ_INSTRUCTION");
+    plan.bulkEraseOpcode = partOpcode(part, "BULKERASE_INSTRUCTION");
+    const long long pageBits = partNumber(part, "PAGE_SIZE");
+    plan.pageBytes = pageBits > 0 ? static_cast<std::size_t>(pageBits / 8) : 0;
+    plan.eraseStepMicroseconds = partNumber(part, "PROGRESS_ERASE_WAITTIME_INC");
+    plan.eraseSteps = std::max(0, device.getOperationProgressCount("erase", nullptr));
+
+    if (!info.progressName.empty()) {
+        const std::string name(info.progressName);
+        plan.totalSteps = std::max(0, device.getOperationProgressCount(name.c_str(), &args));
+    } else if (info.operation == Operation::Checksum && image != nullptr && pageBits > 0) {
+        // The device counts no steps for a checksum: it reads the pages the
+        // image covers.
+        plan.totalSteps = (static_cast<long long>(image->dataSize()) + pageBits - 1) / pageBits;
+    }
+    return plan;
+}
+
+bool invoke(Type1SPIDevice& device, const OperationRequest& request, UT_CMDARGS& args, int index) {
+    DeviceOperation& operations = device;  // the virtual operations, as any host drives them
+    switch (request.info->operation) {
+    case Operation::Program: return operations.program(index, &args);
+    case Operation::Verify: return operations.verify(index, &args);
+    case Operation::Checksum: return operations.checksum(index, &args);
+    case Operation::Erase: return operations.erase(index, &args);
+    case Operation::BlankCheck: return operations.blankCheck(index, &args);
+    case Operation::Readback: return operations.readbackToFile(index, &args);
+    case Operation::IdCode: return operations.readIdcode(index, true);
+    case Operation::Signature: return device.readElectronicSignature(index, true);
+    case Operation::Validate: return operations.validateInstance(index);
+    case Operation::Status: return operations.readDeviceStatus(index, &args);
+    case Operation::Release: return operations.releaseFromStandBy(index, &args);
+    // The two operations outside the table of virtual operations.
+    case Operation::Unlock: return device.unlockStatusRegister(index, &args);
+    case Operation::QuadEnable: return device.writeQuadEnableBit(index, &args, request.operands.at(0) == "set");
+    case Operation::Parts:
+    case Operation::Play: break;
+    }
+    return false;
+}
+
+std::string joined(const std::vector<std::string>& names) {
+    std::string text;
+    for (const std::string& name : names) text += (text.empty() ? "" : ", ") + name;
+    return text;
+}
+
+// Device attributes that carry the answer of some operations.
+void reportAnswer(Type1SPIDevice& device, const OperationInfo& info) {
+    if (info.operation != Operation::IdCode) return;
+    const char* id = device.getAttribute(DeviceNS::ATTR_IDCODE);
+    if (id == nullptr) return;
+    const std::vector<std::string> parts = ConstraintsManager::instance().partsWithId(id);
+    toolInfo(parts.empty() ? std::string("No known part has the JEDEC ID ") + id + "."
+                           : std::string("JEDEC ID ") + id + " belongs to: " + joined(parts) + ".");
+}
+
+// Everything a run needs before its first scan, checked in the order that
+// keeps a refused run free of side effects: options, part, files, then the
+// port and (for --part auto) the identification over it.
+struct PreparedRun {
+    std::string file;  // the operation's image or readback file
+    std::unique_ptr<ConfigDataReader> image;
+    std::unique_ptr<PortSession> session;
+    std::string part;
+    std::unique_ptr<Type1SPIDevice> device;
+};
+
+PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& request) {
+    const OperationInfo& info = *request.info;
+    checkPortFitsRequest(options, info);
+    if (!options.autoPart()) checkPartKnown(options.part, "part");
+    const std::string chip = simulatedChipName(options);
+    if (options.port.isSimulator()) checkPartKnown(chip, "chip");
+
+    // Files before the port: a bad file costs no scan and creates nothing.
+    PreparedRun run;
+    formats::registerStandardFormats();
+    run.file = request.fileOperand();
+    checkFilesApart(options, info, run.file);
+    if (info.operand == OperandKind::ImageFile) run.image = openImage(run.file);
+    if (info.operation == Operation::Readback) checkReadbackTarget(run.file);
+    if (run.image && !options.autoPart()) checkImageFits(*run.image, run.file, options.part);
+
+    run.session = options.port.isSimulator() ? PortSession::openSimulator(options, chip)
+                                             : PortSession::openRecorder(options, options.part);
+    run.part = options.part;
+    std::optional<Identification> identification;
+    try {
+        if (options.autoPart()) {
+            identification = identifyPart(run.session->port(), options.index);
+            run.part = identification->partName;
+            if (run.image) checkImageFits(*run.image, run.file, run.part);
+        }
+        run.device = createDevice(run.part);
+    } catch (const UsageError&) {
+        run.session->abandon();
+        throw;
+    }
+    if (identification)
+        toolInfo("Identified " + run.part + " by its JEDEC ID " + identification->jedecId + ".");
+    return run;
+}
+
+// A recording appears only when the operation succeeded; otherwise it is
+// dropped and an older file of the same name stays as it was.
+void finishRecording(PortSession& session, const std::string& target, int& status, RunFigures& figures) {
+    if (session.recorder() == nullptr) return;
+    if (status != kExitSuccess) {
+        session.abandon();
+        toolInfo("Nothing was recorded: " + target + " is written only when the operation succeeds.");
+        return;
+    }
+    try {
+        session.commit();
+        figures.recordedFile = target;
+    } catch (const svf::SvfError& error) {
+        toolError(std::string("the recording could not be completed: ") + error.what());
+        status = kExitFailure;
+        figures.outcome = RunOutcome::Failed;
+    }
+}
+
+}  // namespace
+
+int runDeviceOperation(const ToolOptions& options, const OperationRequest& request, ProgressAwareSink& sink) {
+    const OperationInfo& info = *request.info;
+    PreparedRun run = prepareRun(options, request);
+    Type1SPIDevice& device = *run.device;
+
+    formats::FixedWidthCif cif(options.dataWidth.value_or(1));
+    device.setConfigData(run.image.get());
+    device.setCifReader(&cif);
+    if (options.dataWidth)
+        device.setAttribute(DeviceNS::ATTR_DATA_WIDTH, std::to_string(*options.dataWidth).c_str(), true);
+    UT_CMDARGS args = request.deviceArguments();
+
+    CancelSignal cancelSignal;
+    ProgressPort progressPort(run.session->port(), progressPlan(device, info, args, run.part, run.image.get()),
+                              &CancelSignal::flag());
+    device.setScanPort(&progressPort);
+
+    std::optional<ProgressDisplay> display;
+    const bool wantsProgress = !info.progressName.empty() || info.operation == Operation::Checksum;
+    if (wantsProgress && !options.quiet && isTerminal(stderr)) {
+        display.emplace(stderr, std::string(info.name));
+        progressPort.setListener(&*display);
+        sink.setDisplay(&*display);
+        display->progressed(0, progressPort.totalSteps());
+    }
+
+    const auto started = std::chrono::steady_clock::now();
+    bool result = false;
+    try {
+        result = invoke(device, request, args, options.index);
+    } catch (const std::exception& error) {
+        toolError(std::string("the operation stopped: ") + error.what());
+        result = false;
+    }
+    // A cancel the operation saw is a cancel, whatever it returned: some
+    // operations end a cancelled run on their success path.
+    const bool cancelled = progressPort.cancelSeen();
+
+    RunFigures figures;
+    figures.operation = std::string(info.name);
+    figures.wallSeconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - started).count();
+    figures.simulatedNanoseconds = run.session->simulatedNanoseconds();
+    figures.bytes = progressPort.dataBytes();
+    figures.outcome = cancelled ? RunOutcome::Cancelled : result ? RunOutcome::Succeeded : RunOutcome::Failed;
+
+    int status = result && !cancelled ? kExitSuccess : kExitFailure;
+    // The device answers a blank check's verdict in an attribute; its
+    // result only says whether the check ran. A recording reads nothing, so
+    // it has no verdict: the played file checks.
+    if (status == kExitSuccess && info.operation == Operation::BlankCheck && run.session->simulator() != nullptr) {
+        const char* blank = device.getAttribute(DeviceNS::ATTR_BLANK);
+        const bool isBlank = blank != nullptr && UT_STR::ICompare(blank, "TRUE") == 0;
+        status = isBlank ? kExitSuccess : kExitFailure;
+        figures.verdict = isBlank ? "found the flash blank" : "found the flash not blank";
+    }
+    if (status == kExitSuccess) reportAnswer(device, info);
+
+    if (display) {
+        if (status == kExitSuccess) display->complete();
+        else display->stop();
+        sink.setDisplay(nullptr);
+        progressPort.setListener(nullptr);
+    }
+    finishRecording(*run.session, options.port.file, status, figures);
+    if (cancelled && info.operation == Operation::Readback)
+        toolInfo(run.file + " holds only the pages read before the cancel.");
+
+    if (!options.quiet) {
+        printRunSummary(figures);
+    } else if (status != kExitSuccess && !cancelled) {
+        // --quiet hides the status lines that explain a failed verify or a
+        // non-blank flash; one line still says what happened.
+        std::fprintf(stderr, "vorant-spi: %s %s\n", figures.operation.c_str(),
+                     figures.verdict.empty() ? "failed" : figures.verdict.c_str());
+    }
+    if (cancelled) {
+        std::fflush(stdout);
+        std::fputs("vorant-spi: cancelled by the user\n", stderr);
+    }
+    return status;
+}
+
+}  // namespace vorant::cli

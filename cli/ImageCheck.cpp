@@ -1,0 +1,40 @@
+#include "cli/ImageCheck.h"
+
+#include "cli/PartListing.h"
+#include "cli/UsageError.h"
+#include "formats/ConfigDataFiles.h"
+#include "formats/FormatError.h"
+#include "host/ConstraintsManager.h"
+
+#include <cstdint>
+
+namespace vorant::cli {
+
+std::unique_ptr<ConfigDataReader> openImage(const std::string& path) {
+    try {
+        return formats::openConfigData(path);
+    } catch (const formats::FormatError& error) {
+        throw UsageError(std::string(error.what()) + "; give a readable .bin, .hex or .mcs image");
+    }
+}
+
+void checkImageFits(ConfigDataReader& image, const std::string& path, const std::string& partName) {
+    const std::int64_t deviceBits =
+        ConstraintsManager::instance().getDeviceLongProperty(partName.c_str(), "DEVICE_SIZE");
+    const std::int64_t imageBits = image.dataSize();
+    if (imageBits <= deviceBits) return;
+    throw UsageError(path + " reaches " + std::to_string(imageBits / 8) + " bytes (from address 0) but " + partName +
+                     " holds " + sizeText(deviceBits / 8) + "; use a larger part or a smaller image");
+}
+
+void checkReadbackTarget(const std::string& path) {
+    try {
+        // Destroyed unfinished: the writer removes its temporary file and
+        // the target is not touched.
+        formats::openConfigDataWriter(path);
+    } catch (const formats::FormatError& error) {
+        throw UsageError(std::string(error.what()) + "; choose a file in a folder that exists and can be written");
+    }
+}
+
+}  // namespace vorant::cli

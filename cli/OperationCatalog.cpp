@@ -1,0 +1,74 @@
+#include "cli/OperationCatalog.h"
+
+namespace vorant::cli {
+
+namespace {
+
+const SwitchInfo kErase{"-e"}, kEraseLong{"-erase"}, kVerify{"-v"}, kVerifyLong{"-verify"},
+    kQeBit{"-qebit"}, kFile{"-f", true}, kFileLong{"-file", true};
+
+std::vector<OperationInfo> buildCatalog() {
+    using O = Operation;
+    using K = OperandKind;
+    return {
+        {O::Program, "program", "program FILE [-e|-erase] [-v|-verify] [-qebit]",
+         "write FILE (.bin, .hex, .mcs) from address 0; -e erases first, -v verifies after",
+         K::ImageFile, {kErase, kEraseLong, kVerify, kVerifyLong, kQeBit}, true, true, "program"},
+        {O::Verify, "verify", "verify FILE [-v|-verify]",
+         "compare the flash with FILE (-v: without the status display)", K::ImageFile,
+         {kVerify, kVerifyLong}, true, true, "verify"},
+        {O::Checksum, "checksum", "checksum FILE [-v|-verify]",
+         "CRC-32 of FILE and of the flash over the range FILE covers", K::ImageFile,
+         {kVerify, kVerifyLong}, true, false, ""},
+        {O::Erase, "erase", "erase [-e|-erase] [-qebit]",
+         "erase the whole flash (-e: without the status display; -qebit: clear Quad Enable)", K::None,
+         {kErase, kEraseLong, kQeBit}, true, true, "erase"},
+        {O::BlankCheck, "blankcheck", "blankcheck", "check that the flash is erased (exit 0: blank)",
+         K::None, {}, true, true, "blankcheck"},
+        {O::Readback, "readback", "readback -f FILE",
+         "read the whole flash into FILE (format from its extension)", K::None, {kFile, kFileLong},
+         true, false, "readbacktofile"},
+        {O::IdCode, "idcode", "idcode", "read and show the 24-bit JEDEC ID", K::None, {}, true, false,
+         ""},
+        {O::Signature, "signature", "signature", "read and show the electronic signature", K::None, {},
+         true, false, ""},
+        {O::Validate, "validate", "validate", "check that the chip's ID is the part's", K::None, {},
+         true, false, ""},
+        {O::Status, "status", "status", "show the status registers", K::None, {}, true, false, ""},
+        {O::Release, "release", "release", "release the chip from deep power-down", K::None, {}, true,
+         true, ""},
+        {O::Unlock, "unlock", "unlock", "clear the block-protect bits", K::None, {}, true, true, ""},
+        {O::QuadEnable, "qe", "qe set|clear", "set or clear the Quad Enable bit", K::QeMode, {}, true,
+         true, ""},
+        {O::Parts, "parts", "parts [PATTERN]",
+         "list the part database (PATTERN: '*' and '?' wildcards, any case)", K::OptionalPattern, {},
+         false, false, ""},
+        {O::Play, "play", "play FILE.svf",
+         "play a recorded SVF file on the simulated flash and report mismatches", K::SvfFile, {}, false,
+         false, ""},
+    };
+}
+
+}  // namespace
+
+const std::vector<OperationInfo>& operationCatalog() {
+    static const std::vector<OperationInfo> catalog = buildCatalog();
+    return catalog;
+}
+
+const OperationInfo* findOperation(std::string_view name) {
+    for (const OperationInfo& info : operationCatalog())
+        if (info.name == name) return &info;
+    return nullptr;
+}
+
+std::string operationNames() {
+    std::string names;
+    for (const OperationInfo& info : operationCatalog()) {
+        if (!names.empty()) names += ", ";
+        names += info.name;
+    }
+    return names;
+}
+
+}  // namespace vorant::cli

@@ -1,0 +1,73 @@
+#include "cli/PartIdentification.h"
+
+#include "cli/UsageError.h"
+#include "host/ConstraintsManager.h"
+#include "host/VorantException.h"
+#include "s/Type1SPIDevice.h"
+
+#include <memory>
+
+namespace vorant::cli {
+
+namespace {
+
+constexpr const char* kJedecIdInstruction = "10011111";  // 9Fh
+
+// The first part (by name) that reads its ID with 9Fh and makes a device.
+std::unique_ptr<Type1SPIDevice> jedecIdReader() {
+    ConstraintsManager& database = ConstraintsManager::instance();
+    for (const std::string& name : database.partNames()) {
+        if (!database.hasProperty(name, "IDENTIFICATION_INSTRUCTION") ||
+            std::string(database.getDeviceStringProperty(name.c_str(), "IDENTIFICATION_INSTRUCTION")) !=
+                kJedecIdInstruction)
+            continue;
+        try {
+            if (std::unique_ptr<Type1SPIDevice> device{create_type1_spi_device(name.c_str())}) return device;
+        } catch (const VorantException&) {
+            // Not usable as a device: try the next part.
+        }
+    }
+    throw UsageError("--part auto needs a part that reads the JEDEC ID with 9Fh, and the database has none; "
+                     "name the part with --part NAME");
+}
+
+std::string joined(const std::vector<std::string>& names) {
+    std::string text;
+    for (const std::string& name : names) text += (text.empty() ? "" : ", ") + name;
+    return text;
+}
+
+}  // namespace
+
+std::string identificationProblem(const std::string& jedecId, const std::vector<std::string>& matches) {
+    if (jedecId.find_first_not_of("Ff") == std::string::npos || jedecId.find_first_not_of('0') == std::string::npos)
+        return "no chip answered the JEDEC ID read (it read " + jedecId +
+               "); check the connection, wake a chip in deep power-down with "
+               "'vorant-spi --part NAME release', or name the part with --part NAME";
+    if (matches.empty())
+        return "no part in the database has the JEDEC ID " + jedecId +
+               "; add one with --parts FILE or name the part with --part NAME";
+    if (matches.size() > 1)
+        return "the JEDEC ID " + jedecId + " belongs to several parts (" + joined(matches) +
+               "); choose one with --part NAME";
+    return {};
+}
+
+Identification identifyPart(ScanPort& port, int index) {
+    std::unique_ptr<Type1SPIDevice> reader = jedecIdReader();
+    reader->setScanPort(&port);
+    const bool read = reader->readIdcode(index, false);
+    const char* id = reader->getAttribute(DeviceNS::ATTR_IDCODE);
+    if (!read || id == nullptr || *id == '\0')
+        throw UsageError("the JEDEC ID could not be read over the port; name the part with --part NAME");
+
+    Identification identification;
+    identification.jedecId = id;
+    const std::vector<std::string> matches = ConstraintsManager::instance().partsWithId(identification.jedecId);
+    if (const std::string problem = identificationProblem(identification.jedecId, matches); !problem.empty())
+        throw UsageError(problem);
+    identification.partName = matches.front();
+    return identification;
+}
+
+}  // namespace vorant::cli

@@ -1,0 +1,25 @@
+#pragma once
+#include "host/ScanPort.h"
+
+#include <string>
+#include <vector>
+
+namespace vorant::cli {
+
+struct Identification {
+    std::string partName;
+    std::string jedecId;  // as read, hexadecimal text
+};
+
+// --part auto: reads the JEDEC ID over the port with a device built for a
+// part that reads it with 9Fh (every shipped part does, so any of them can
+// ask whatever chip answers) and returns the one part that has that ID.
+// Throws UsageError, listing what matched, when no chip answers, no part
+// has the ID, or several do.
+Identification identifyPart(ScanPort& port, int index);
+
+// The message for an ID and the parts that have it; empty when exactly one
+// does. Exposed for tests.
+std::string identificationProblem(const std::string& jedecId, const std::vector<std::string>& matches);
+
+}  // namespace vorant::cli

@@ -1,0 +1,85 @@
+#include "cli/SvfPlayback.h"
+
+#include "cli/RunSummary.h"
+#include "cli/SimFaultOption.h"
+#include "cli/Tool.h"
+#include "cli/ToolMessages.h"
+#include "cli/UsageError.h"
+#include "host/ConstraintsManager.h"
+#include "host/VorantException.h"
+#include "ports/sim/FlashModel.h"
+#include "ports/svf/SvfError.h"
+#include "ports/svf/SvfPlayer.h"
+
+#include <chrono>
+#include <filesystem>
+#include <system_error>
+
+namespace vorant::cli {
+
+std::string simulatedChipName(const ToolOptions& options) {
+    if (options.chip) return *options.chip;
+    if (!options.autoPart()) return options.part;
+    return kDefaultSimulatedChip;
+}
+
+int playRecording(const ToolOptions& options, const std::string& svfFile) {
+    if (!options.port.isSimulator())
+        throw UsageError("'play' plays a file on the simulator; use --port sim or --port sim:FILE");
+    std::error_code error;
+    if (!std::filesystem::is_regular_file(svfFile, error))
+        throw UsageError(svfFile + ": no such SVF file; give the file a recording run wrote");
+
+    const std::string chip = simulatedChipName(options);
+    if (!ConstraintsManager::instance().hasPart(chip))
+        throw UsageError("unknown part '" + chip + "'; 'vorant-spi parts' lists the known parts");
+
+    sim::FlashConfig config;
+    try {
+        config = sim::FlashConfig::fromPartDatabase(chip);
+    } catch (const VorantException& problem) {
+        throw UsageError(std::string(problem.what()) + "; choose another chip with --chip NAME");
+    }
+    svf::SvfPlayerOptions playerOptions;
+    if (options.clockHz) playerOptions.spiClockHz = *options.clockHz;
+    const std::string& backingFile = options.port.file;
+    const bool backingFileExisted = !backingFile.empty() && std::filesystem::exists(backingFile, error);
+    const auto started = std::chrono::steady_clock::now();
+    svf::SvfPlayResult result;
+    try {
+        sim::FlashModel flash(config, simFaultPlan(options.simFaults), backingFile);
+        svf::SvfPlayer player(flash, playerOptions);
+        // The player checks the whole file before it plays the first
+        // statement, so a malformed file leaves the flash as it was.
+        result = player.playFile(svfFile);
+    } catch (const VorantException& problem) {
+        throw UsageError(std::string(problem.what()) + "; use a flash file made for this chip, or a new file name");
+    } catch (const svf::SvfError& problem) {
+        // Nothing was played: a backing file made for this run goes again.
+        if (!backingFile.empty() && !backingFileExisted) std::filesystem::remove(backingFile, error);
+        if (dynamic_cast<const svf::SvfParseError*>(&problem) != nullptr)
+            throw UsageError(svfFile + ": " + problem.what() + "; the file is not valid SVF and nothing was played");
+        throw UsageError(std::string(problem.what()) + "; give a readable SVF file");
+    }
+
+    constexpr std::size_t kMismatchesShown = 20;
+    for (std::size_t i = 0; i < result.mismatches.size() && i < kMismatchesShown; ++i)
+        toolError(svfFile + ": " + result.mismatches[i].describe());
+    if (result.mismatches.size() > kMismatchesShown)
+        toolError("... and " + std::to_string(result.mismatches.size() - kMismatchesShown) + " more mismatches");
+    const std::string verdict =
+        result.passed() ? "no mismatches" : std::to_string(result.mismatches.size()) + " mismatches";
+    toolInfo("Played " + svfFile + " on a simulated " + chip + ": " + std::to_string(result.sdrCount) + " scans, " +
+             std::to_string(result.comparedSdrs) + " compared, " + verdict + ".");
+
+    RunFigures figures;
+    figures.operation = "play";
+    figures.outcome = result.passed() ? RunOutcome::Succeeded : RunOutcome::Failed;
+    figures.wallSeconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - started).count();
+    figures.simulatedNanoseconds = result.busNanoseconds + result.waitNanoseconds;
+    figures.bytes = result.sdrBits / 8;
+    if (!options.quiet) printRunSummary(figures);
+    return result.passed() ? kExitSuccess : kExitFailure;
+}
+
+}  // namespace vorant::cli

@@ -1,0 +1,80 @@
+#include "cli/Tool.h"
+
+#include "cli/CommandLine.h"
+#include "cli/DeviceRun.h"
+#include "cli/PartDatabaseSetup.h"
+#include "cli/PartListing.h"
+#include "cli/ProgressAwareSink.h"
+#include "cli/SvfPlayback.h"
+#include "cli/UsageError.h"
+#include "host/MessageSinks.h"
+
+#include <cstdio>
+#include <exception>
+
+namespace vorant::cli {
+
+namespace {
+
+void printToolError(const std::string& message) {
+    std::fflush(stdout);
+    std::fprintf(stderr, "vorant-spi: %s\n", message.c_str());
+    std::fflush(stderr);
+}
+
+int listParts(const OperationRequest& request) {
+    const std::string pattern = request.operands.empty() ? "*" : request.operands.front();
+    const std::vector<PartSummary> parts = matchingParts(pattern);
+    if (parts.empty()) {
+        printToolError("no part matches '" + pattern + "'; 'vorant-spi parts' lists them all");
+        return kExitFailure;
+    }
+    // The listing is the answer, so --quiet does not hide it.
+    std::fputs(partTable(parts).c_str(), stdout);
+    return kExitSuccess;
+}
+
+int runOperation(const CommandLine& command, ProgressAwareSink& sink) {
+    loadPartDatabase(command.options.partFiles);
+    switch (command.request.info->operation) {
+    case Operation::Parts: return listParts(command.request);
+    case Operation::Play: return playRecording(command.options, command.request.fileOperand());
+    default: return runDeviceOperation(command.options, command.request, sink);
+    }
+}
+
+}  // namespace
+
+int runTool(int argc, char** argv) {
+    CommandLine command;
+    try {
+        command = parseCommandLine(std::vector<std::string>(argv + (argc > 0 ? 1 : 0), argv + argc));
+    } catch (const UsageError& error) {
+        printToolError(error.what());
+        return kExitUsage;
+    } catch (const std::exception& error) {
+        printToolError(std::string("unexpected failure: ") + error.what());
+        return kExitFailure;
+    }
+    switch (command.action) {
+    case CommandLine::Action::ShowHelp: std::fputs(command.helpText.c_str(), stdout); return kExitSuccess;
+    case CommandLine::Action::ShowVersion: std::printf("%s\n", versionText().c_str()); return kExitSuccess;
+    case CommandLine::Action::Run: break;
+    }
+
+    ProgressAwareSink sink(stdout, stderr, command.options.debug, command.options.quiet);
+    vorant::ScopedSink installed(&sink);
+    try {
+        const int status = runOperation(command, sink);
+        std::fflush(stdout);
+        return status;
+    } catch (const UsageError& error) {
+        printToolError(error.what());
+        return kExitUsage;
+    } catch (const std::exception& error) {
+        printToolError(std::string("unexpected failure: ") + error.what());
+        return kExitFailure;
+    }
+}
+
+}  // namespace vorant::cli
