@@ -1,6 +1,9 @@
 #pragma once
-// Scratch files for the format tests: a private temporary directory per
-// test, removed with everything in it.
+// Helpers shared by the format tests: a private scratch directory, file
+// contents, and flash bytes handed to a writer the way a readback does.
+#include "formats/ConfigDataFiles.h"
+#include "formats/FormatError.h"
+
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
@@ -12,60 +15,27 @@
 namespace vorant::formats::testing {
 
 using Bytes = std::vector<unsigned char>;
+namespace fs = std::filesystem;
 
-class ScratchDirectory {
-public:
+// A fresh temporary directory, removed with everything in it.
+struct ScratchDirectory {
+    fs::path path;
     ScratchDirectory() {
-        std::random_device device;
-        const auto base = std::filesystem::temp_directory_path();
-        do {
-            path_ = base / ("vorant-formats-" + std::to_string(device()) + std::to_string(device()));
-        } while (!std::filesystem::create_directory(path_));
+        std::random_device random;
+        while (!fs::create_directory(path = fs::temp_directory_path() / ("vorant-formats-" + std::to_string(random())))) {}
     }
-    ~ScratchDirectory() {
-        std::error_code ec;
-        std::filesystem::permissions(path_, std::filesystem::perms::owner_all, ec);
-        std::filesystem::remove_all(path_, ec);
-    }
-    ScratchDirectory(const ScratchDirectory&) = delete;
-    ScratchDirectory& operator=(const ScratchDirectory&) = delete;
-
-    const std::filesystem::path& path() const { return path_; }
-    std::string file(const std::string& name) const { return (path_ / name).string(); }
-
-    // Names of everything in the directory, sorted.
-    std::vector<std::string> listing() const {
-        std::vector<std::string> names;
-        for (const auto& entry : std::filesystem::directory_iterator(path_)) {
-            names.push_back(entry.path().filename().string());
-        }
-        std::sort(names.begin(), names.end());
-        return names;
-    }
-
-private:
-    std::filesystem::path path_;
+    ~ScratchDirectory() { std::error_code ignored; fs::remove_all(path, ignored); }
+    std::string file(const std::string& name) const { return (path / name).string(); }
+    long entries() const { return std::distance(fs::directory_iterator(path), fs::directory_iterator()); }
 };
 
-inline void writeFile(const std::string& path, const std::string& content) {
-    std::ofstream(path, std::ios::binary) << content;
+template <class Content> void writeFile(const std::string& path, const Content& content) {
+    std::ofstream(path, std::ios::binary).write(reinterpret_cast<const char*>(content.data()), content.size());
 }
-
-inline void writeFile(const std::string& path, const Bytes& content) {
-    std::ofstream(path, std::ios::binary)
-        .write(reinterpret_cast<const char*>(content.data()), static_cast<std::streamsize>(content.size()));
-}
-
-inline Bytes readFile(const std::string& path) {
+template <class Content = Bytes> Content readFile(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
-    return Bytes(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+    return Content(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
 }
-
-inline std::string readText(const std::string& path) {
-    std::ifstream in(path, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-}
-
 inline Bytes randomBytes(std::size_t count, unsigned seed) {
     std::mt19937 generator(seed);
     Bytes bytes(count);
@@ -73,17 +43,22 @@ inline Bytes randomBytes(std::size_t count, unsigned seed) {
     return bytes;
 }
 
-// Flash bytes as a capture delivers them: every byte's bit order reversed.
-inline Bytes captured(const Bytes& flashBytes) {
-    Bytes result(flashBytes.size());
-    for (std::size_t i = 0; i < flashBytes.size(); ++i) {
-        unsigned reversed = 0;
-        for (int bit = 0; bit < 8; ++bit) {
-            if (flashBytes[i] & (1u << bit)) reversed |= 0x80u >> bit;
-        }
-        result[i] = static_cast<unsigned char>(reversed);
-    }
-    return result;
+// Hands flash bytes to a writer as a readback does: one page per call, each
+// byte captured with its bit order reversed (flash 0x01 arrives as 0x80).
+inline bool writePages(ConfigDataWriter& writer, const Bytes& flash, int offset, std::size_t pageBytes) {
+    Bytes capture(flash.size());
+    for (std::size_t i = 0; i < flash.size(); ++i)
+        for (int bit = 0; bit < 8; ++bit) capture[i] |= static_cast<unsigned char>(((flash[i] >> bit) & 1) << (7 - bit));
+    bool ok = true;
+    for (std::size_t start = 0; start < capture.size(); start += pageBytes)
+        ok &= writer.writeData(capture.data() + start, offset + int(start), int(std::min(pageBytes, capture.size() - start) * 8), 0);
+    return ok;
+}
+
+// The text of the FormatError that action throws, "" when it throws none.
+template <class Action> std::string formatErrorOf(Action&& action) {
+    try { action(); } catch (const FormatError& error) { return error.what(); }
+    return "";
 }
 
 }  // namespace vorant::formats::testing
