@@ -63,6 +63,24 @@ void checkPartKnown(const std::string& name, const char* what) {
                          "'; 'vorant-spi parts' lists the known parts, --parts FILE adds your own");
 }
 
+// The Quad Enable write reads both status registers and writes them back
+// with one 01h of two bytes, changing register 2 bit 1. Only parts whose
+// X4_READ is "TRUE" keep Quad Enable there; on the others the second byte
+// lands in another register (on some, a configuration register with
+// one-time bits), so the tool sends no such write to them.
+void checkQuadEnableWritable(const std::string& part, const OperationRequest& request) {
+    const bool qe = request.info->operation == Operation::QuadEnable;
+    const auto& tokens = request.switchTokens;
+    if (!qe && std::find(tokens.begin(), tokens.end(), "-qebit") == tokens.end()) return;
+    ConstraintsManager& database = ConstraintsManager::instance();
+    if (database.hasProperty(part, "X4_READ") &&
+        UT_STR::ICompare(database.getDeviceStringProperty(part.c_str(), "X4_READ"), "TRUE") == 0)
+        return;
+    const std::string asked = qe ? "'qe " + request.operands.at(0) + "'" : "-qebit";
+    throw UsageError(part + " has no Quad Enable bit vorant-spi can write (its X4_READ is not TRUE); " + asked +
+                     " is refused and nothing was written to the flash");
+}
+
 std::unique_ptr<Type1SPIDevice> createDevice(const std::string& partName) {
     try {
         std::unique_ptr<Type1SPIDevice> device(create_type1_spi_device(partName.c_str()));
@@ -164,7 +182,10 @@ struct PreparedRun {
 PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& request) {
     const OperationInfo& info = *request.info;
     checkPortFitsRequest(options, info);
-    if (!options.autoPart()) checkPartKnown(options.part, "part");
+    if (!options.autoPart()) {
+        checkPartKnown(options.part, "part");
+        checkQuadEnableWritable(options.part, request);
+    }
     const std::string chip = simulatedChipName(options);
     if (options.port.isSimulator()) checkPartKnown(chip, "chip");
 
@@ -185,6 +206,7 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
         if (options.autoPart()) {
             identification = identifyPart(run.session->port(), options.index);
             run.part = identification->partName;
+            checkQuadEnableWritable(run.part, request);
             if (run.image) checkImageFits(*run.image, run.file, run.part);
         }
         run.device = createDevice(run.part);
@@ -254,7 +276,13 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     }
     // A cancel the operation saw is a cancel, whatever it returned: some
     // operations end a cancelled run on their success path.
-    const bool cancelled = progressPort.cancelSeen();
+    // The recorder also answers a cancel query once its file can no longer
+    // be written (a full disk): that run failed, nobody cancelled it.
+    const bool writeFailed =
+        run.session->recorder() != nullptr && progressPort.cancelSeen() && !CancelSignal::requested();
+    const bool cancelled = progressPort.cancelSeen() && !writeFailed;
+    if (writeFailed) toolError(options.port.file + " could not be written (is the disk full?)");
+    result = result && !writeFailed;
 
     RunFigures figures;
     figures.operation = std::string(info.name);

@@ -38,7 +38,7 @@ std::vector<OperationInfo> buildCatalog() {
         {O::Release, "release", "release", "release the chip from deep power-down", K::None, {}, true,
          true, ""},
         {O::Unlock, "unlock", "unlock", "clear the block-protect bits", K::None, {}, true, true, ""},
-        {O::QuadEnable, "qe", "qe set|clear", "set or clear the Quad Enable bit", K::QeMode, {}, true,
+        {O::QuadEnable, "qe", "qe set|clear", "set or clear Quad Enable (parts with X4_READ only)", K::QeMode, {}, true,
          true, ""},
         {O::Parts, "parts", "parts [PATTERN]",
          "list the part database (PATTERN: '*' and '?' wildcards, any case)", K::OptionalPattern, {},
