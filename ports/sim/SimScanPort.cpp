@@ -1,5 +1,7 @@
 #include "ports/sim/SimScanPort.h"
 
+#include "ports/sim/WireByteOrder.h"
+
 #include <algorithm>
 #include <array>
 #include <exception>
@@ -9,21 +11,6 @@ namespace vorant::sim {
 namespace {
 
 static_assert(std::atomic<bool>::is_always_lock_free, "the cancel flag must be usable from a signal handler");
-
-// A shift vector stores the first bit on the wire in bit 0 of byte 0, while
-// SPI sends a byte most significant bit first: a byte-aligned wire byte is
-// its storage byte mirrored.
-constexpr std::array<std::uint8_t, 256> makeMirrorTable() {
-    std::array<std::uint8_t, 256> table{};
-    for (unsigned value = 0; value < 256; ++value) {
-        unsigned mirrored = 0;
-        for (unsigned bit = 0; bit < 8; ++bit)
-            if (value & (1u << bit)) mirrored |= 0x80u >> bit;
-        table[value] = static_cast<std::uint8_t>(mirrored);
-    }
-    return table;
-}
-constexpr std::array<std::uint8_t, 256> kMirror = makeMirrorTable();
 
 constexpr std::size_t kChunkBytes = 4096;
 
@@ -152,10 +139,10 @@ void SimScanPort::clock(const RLBitVec& tdi, RLBitVec* captured) {
     // within the captured bits.
     auto store = [&](std::size_t index, std::uint8_t wireByte) {
         if (index < captureWholeBytes) {
-            out[index] = kMirror[wireByte];
+            out[index] = kWireMirror[wireByte];
         } else if (index * 8 < captureBits) {
             const auto keep = static_cast<std::uint8_t>((1u << (captureBits - index * 8)) - 1);
-            out[index] = static_cast<std::uint8_t>((out[index] & ~keep) | (kMirror[wireByte] & keep));
+            out[index] = static_cast<std::uint8_t>((out[index] & ~keep) | (kWireMirror[wireByte] & keep));
         }
     };
 
@@ -163,7 +150,7 @@ void SimScanPort::clock(const RLBitVec& tdi, RLBitVec* captured) {
     std::uint8_t received[kChunkBytes];
     for (std::size_t done = 0; done < wholeBytes;) {
         const std::size_t n = std::min(kChunkBytes, wholeBytes - done);
-        for (std::size_t k = 0; k < n; ++k) wire[k] = kMirror[in[done + k]];
+        for (std::size_t k = 0; k < n; ++k) wire[k] = kWireMirror[in[done + k]];
         const bool capturing = done * 8 < captureBits;
         model_.clockBytes(wire, capturing ? received : nullptr, n);
         if (capturing) {

@@ -1,5 +1,7 @@
 #include "ports/svf/SvfPlayer.h"
 
+#include "ports/sim/WireByteOrder.h"
+
 #include "ports/svf/SvfError.h"
 
 #include <algorithm>
@@ -11,21 +13,6 @@
 
 namespace vorant::svf {
 namespace {
-
-// Scan bit 8k is the first bit of wire byte k and the flash clocks bytes
-// most significant bit first, so a scan byte and its wire byte are mirror
-// images.
-constexpr std::array<std::uint8_t, 256> makeMirror() {
-    std::array<std::uint8_t, 256> table{};
-    for (unsigned value = 0; value < 256; ++value) {
-        unsigned mirrored = 0;
-        for (unsigned bit = 0; bit < 8; ++bit)
-            if (value & (1u << bit)) mirrored |= 0x80u >> bit;
-        table[value] = static_cast<std::uint8_t>(mirrored);
-    }
-    return table;
-}
-constexpr std::array<std::uint8_t, 256> kMirror = makeMirror();
 
 std::string hexByte(std::uint8_t value) {
     const char* digits = "0123456789ABCDEF";
@@ -125,7 +112,7 @@ void SvfPlayer::playSdr(const SvfStatement& statement, SvfPlayResult& result) {
     const std::size_t wholeBytes = bits / 8;
     wireOut_.resize(wholeBytes);
     wireIn_.resize(wholeBytes);
-    for (std::size_t k = 0; k < wholeBytes; ++k) wireOut_[k] = kMirror[mosi[k]];
+    for (std::size_t k = 0; k < wholeBytes; ++k) wireOut_[k] = sim::kWireMirror[mosi[k]];
 
     const std::uint64_t start = flash_.now();
     flash_.select();
@@ -133,7 +120,7 @@ void SvfPlayer::playSdr(const SvfStatement& statement, SvfPlayResult& result) {
     for (std::size_t i = wholeBytes * 8; i < bits; ++i) captured_.setBit(i, flash_.clockBit(scan.tdi.bit(i)));
     flash_.deselect();
     result.busNanoseconds += flash_.now() - start;
-    for (std::size_t k = 0; k < wholeBytes; ++k) miso[k] = kMirror[wireIn_[k]];
+    for (std::size_t k = 0; k < wholeBytes; ++k) miso[k] = sim::kWireMirror[wireIn_[k]];
 
     if (scan.compare) {
         ++result.comparedSdrs;
@@ -152,8 +139,8 @@ void SvfPlayer::compare(const SvfStatement& statement, SvfPlayResult& result) co
         if (differing == 0) continue;
         if (mismatch.bitCount == 0) {
             mismatch.firstBit = k * 8 + static_cast<std::size_t>(std::countr_zero(differing));
-            mismatch.expectedByte = kMirror[expected[k]];
-            mismatch.capturedByte = kMirror[captured[k]];
+            mismatch.expectedByte = sim::kWireMirror[expected[k]];
+            mismatch.capturedByte = sim::kWireMirror[captured[k]];
         }
         mismatch.bitCount += static_cast<std::size_t>(std::popcount(differing));
     }
