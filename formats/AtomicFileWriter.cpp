@@ -1,8 +1,14 @@
 #include "formats/AtomicFileWriter.h"
 
+#include "formats/FormatError.h"
+#include "host/VorantException.h"
+
 namespace vorant::formats {
 
-AtomicFileWriter::AtomicFileWriter(const std::string& target) : file_(target) {}
+AtomicFileWriter::AtomicFileWriter(const std::string& target) try : file_(target) {
+} catch (const VorantException& error) {
+    throw FormatError(error.what());
+}
 
 bool AtomicFileWriter::beginWrite() {
     if (ended_) return fail(targetName() + ": beginWrite after endWrite");

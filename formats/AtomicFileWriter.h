@@ -1,5 +1,5 @@
 #pragma once
-#include "formats/AtomicOutputFile.h"
+#include "host/AtomicOutputFile.h"
 #include "host/ConfigData.h"
 
 #include <cstdint>
@@ -40,7 +40,7 @@ protected:
     virtual bool finishData() = 0;
 
 private:
-    AtomicOutputFile file_;
+    vorant::AtomicOutputFile file_;
     std::string error_;
     bool failed_ = false;
     bool ended_ = false;

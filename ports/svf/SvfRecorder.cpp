@@ -1,5 +1,7 @@
 #include "ports/svf/SvfRecorder.h"
 
+#include "host/VorantException.h"
+
 #include "ports/svf/SvfError.h"
 #include "ports/svf/SvfHex.h"
 #include "ports/svf/SvfParser.h"
@@ -81,11 +83,13 @@ void appendClipped(BitBuffer& out, const RLBitVec* vector, std::size_t bits) {
 
 }  // namespace
 
-SvfRecorder::SvfRecorder(std::filesystem::path target, SvfRecorderOptions options)
+SvfRecorder::SvfRecorder(std::filesystem::path target, SvfRecorderOptions options) try
     : file_(checkedTarget(std::move(target), options)) {
     buffer_.reserve(kFlushThreshold + 64 * 1024);
     writeHeader(options);
     flushBuffer();
+} catch (const VorantException& error) {
+    throw SvfError(std::string("cannot write an SVF file: ") + error.what());
 }
 
 SvfRecorder::~SvfRecorder() = default;
@@ -241,7 +245,8 @@ void SvfRecorder::finish() {
     closeTransaction();
     flushBuffer();
     finished_ = true;
-    file_.commit();
+    std::string error;
+    if (!file_.commit(error)) throw SvfError(error);
 }
 
 }  // namespace vorant::svf

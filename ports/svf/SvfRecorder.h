@@ -11,7 +11,7 @@
 
 #include "host/RLBitVec.h"
 #include "host/ScanPort.h"
-#include "ports/svf/AtomicOutputFile.h"
+#include "host/AtomicOutputFile.h"
 #include "ports/svf/BitBuffer.h"
 
 #include <atomic>
@@ -93,7 +93,7 @@ private:
     void flushIfFull();
     void flushBuffer();
 
-    AtomicOutputFile file_;
+    vorant::AtomicOutputFile file_;
     std::string buffer_;
     // The transaction being joined. tdo_ and mask_ are only kept once a
     // shift of it has a mask bit set (compares_).
