@@ -5,4 +5,9 @@ cd "$(dirname "$0")/.."
 scripts/install-deps.sh
 cmake --preset ci >/dev/null
 cmake --build --preset ci -j 2
+# The factory is exported under its plain C name, and nothing else of the
+# plug-in but the class.
+nm -D --defined-only build/ci/bin/libVorantType1SPIDevice.so | grep -q ' T create_type1_spi_device$' \
+  || { echo "FAIL: libVorantType1SPIDevice.so does not export create_type1_spi_device" >&2; exit 1; }
+build/ci/bin/vorant-bench
 ctest --preset ci

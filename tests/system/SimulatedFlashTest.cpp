@@ -182,9 +182,20 @@ TEST(SimulatedFlash, QuadEnableSetAndClearSurviveInTheChipAndKeepRegisterOne) {
     EXPECT_EQ(rig.port->model().status1(), 0x00);
     ASSERT_TRUE(rig.device->writeQuadEnableBit(0, nullptr, false));
     EXPECT_EQ(rig.port->model().status2() & 0x02, 0x00);
-    rig.messages.clear();
+}
+
+TEST(SimulatedFlash, TheStatusDisplayShowsTheChipsRegistersBitByBit) {
+    SystemRig rig("W25Q128JV");
+    rig.port->model().setStatus(0x1C, 0x02);  // BP0-BP2 set, QE set
     ASSERT_TRUE(rig.device->readDeviceStatus(0, nullptr));
-    EXPECT_TRUE(contains(rig.messages.texts(MessageKind::Status), "W25Q128JV Status Register Contents = 0x0000.\n"));
+    const auto status = rig.messages.texts(MessageKind::Status);
+    EXPECT_TRUE(contains(status, "W25Q128JV Status Register Contents = 0x021C.\n")) << rig.messages.transcript();
+    char line[80];
+    for (const auto& [label, value] : {std::pair{"QE", 1}, {"BP2", 1}, {"BP0", 1}, {"TB", 0}, {"BUSY", 0}}) {
+        std::snprintf(line, sizeof line, "%-50s:%10d\n", label, value);
+        EXPECT_TRUE(contains(status, line)) << line;
+    }
+    EXPECT_EQ(status.size(), 1u + 15u) << "the contents line and one line per labelled bit (one is NOT_VALID)";
 }
 
 }  // namespace
