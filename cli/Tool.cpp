@@ -43,12 +43,12 @@ int runOperation(const CommandLine& command, ProgressAwareSink& sink) {
     }
 }
 
-}  // namespace
-
-int runTool(int argc, char** argv) {
-    CommandLine command;
+// Runs a step of the tool; a usage error becomes its one line and exit
+// status 2, anything unexpected a line and status 1.
+template <class Step>
+int guarded(Step&& step) {
     try {
-        command = parseCommandLine(std::vector<std::string>(argv + (argc > 0 ? 1 : 0), argv + argc));
+        return step();
     } catch (const UsageError& error) {
         printToolError(error.what());
         return kExitUsage;
@@ -56,6 +56,17 @@ int runTool(int argc, char** argv) {
         printToolError(std::string("unexpected failure: ") + error.what());
         return kExitFailure;
     }
+}
+
+}  // namespace
+
+int runTool(int argc, char** argv) {
+    CommandLine command;
+    const int parsed = guarded([&] {
+        command = parseCommandLine(std::vector<std::string>(argv + (argc > 0 ? 1 : 0), argv + argc));
+        return kExitSuccess;
+    });
+    if (parsed != kExitSuccess) return parsed;
     switch (command.action) {
     case CommandLine::Action::ShowHelp: std::fputs(command.helpText.c_str(), stdout); return kExitSuccess;
     case CommandLine::Action::ShowVersion: std::printf("%s\n", versionText().c_str()); return kExitSuccess;
@@ -64,17 +75,11 @@ int runTool(int argc, char** argv) {
 
     ProgressAwareSink sink(stdout, stderr, command.options.debug, command.options.quiet);
     vorant::ScopedSink installed(&sink);
-    try {
+    return guarded([&] {
         const int status = runOperation(command, sink);
         std::fflush(stdout);
         return status;
-    } catch (const UsageError& error) {
-        printToolError(error.what());
-        return kExitUsage;
-    } catch (const std::exception& error) {
-        printToolError(std::string("unexpected failure: ") + error.what());
-        return kExitFailure;
-    }
+    });
 }
 
 }  // namespace vorant::cli
