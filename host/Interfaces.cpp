@@ -10,6 +10,8 @@
 #include <mutex>
 
 ScanPort::~ScanPort() = default;
+const char* ScanPort::failureReason() { return nullptr; }
+bool ScanPort::connectionLost() { return false; }
 ConfigDataReader::~ConfigDataReader() = default;
 ConfigDataWriter::~ConfigDataWriter() = default;
 CifReader::~CifReader() = default;

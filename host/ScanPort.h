@@ -35,6 +35,14 @@ public:
     virtual bool wait(int time, bool microseconds) = 0;
     // true when the running operation is to stop; level is 2.
     virtual bool isCancelled(int level) = 0;
+
+    // Added after the operations above, so their places in the table stay.
+    // Why the last failing shift or wait failed, in the port's own words;
+    // null while nothing has failed.
+    virtual const char* failureReason();
+    // true once the cable itself is gone (unplugged, server closed): every
+    // further call would fail too, so waiting or polling on is pointless.
+    virtual bool connectionLost();
 };
 
 // The port a device has before the host gives it one: every transfer fails
@@ -47,4 +55,6 @@ public:
     bool shiftWrite(int, RLBitVec*, int) override { return false; }
     bool wait(int, bool) override { return false; }
     bool isCancelled(int) override { return true; }
+    const char* failureReason() override { return "no scan port was given to the device"; }
+    bool connectionLost() override { return true; }
 };
