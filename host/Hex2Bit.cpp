@@ -41,10 +41,9 @@ std::unique_ptr<RLBitVec> Hex2Bit::convertHexString2BitVec(const char* text, int
         if (value < 0) throw VorantException("'" + digits + "' is not a hexadecimal text");
         for (int b = 3; b >= 0; --b, ++bit) {
             const bool set = (value >> b) & 1;
-            if (bit < 0) {
-                if (set) throw VorantException("'" + digits + "' does not fit " + std::to_string(bits) + " bits");
-                continue;
-            }
+            // A text wider than the vector keeps its low-order digits: the
+            // 8-bit signature read preloads itself from a 24-bit ID text.
+            if (bit < 0) continue;
             vector->setBit(static_cast<std::size_t>(bit), set);
         }
     }

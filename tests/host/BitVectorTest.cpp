@@ -86,9 +86,13 @@ TEST(Conversions, IdCodeRoundTripsThroughTheCapturedBits) {
     EXPECT_STREQ(Hex2Bit::convertBinData2HexString(signature->data(), 8, true, false), "17");
 }
 
-TEST(Conversions, HexTextsThatCannotBeConvertedThrow) {
+TEST(Conversions, HexTextsAreRightAlignedInTheirWidth) {
     EXPECT_THROW(Hex2Bit::convertHexString2BitVec("EF40G8", 24, true, false, false), VorantException);
-    EXPECT_THROW(Hex2Bit::convertHexString2BitVec("1EF4018", 24, true, false, false), VorantException);
+    // Wider than asked: the low-order (last) digits stay.
+    auto wide = Hex2Bit::convertHexString2BitVec("1EF4018", 24, true, false, false);
+    EXPECT_STREQ(Hex2Bit::convertBinData2HexString(wide->data(), 24, true, false), "EF4018");
+    auto signature = Hex2Bit::convertHexString2BitVec("EF4017", 8, true, false, false);
+    EXPECT_STREQ(Hex2Bit::convertBinData2HexString(signature->data(), 8, true, false), "17");
     auto padded = Hex2Bit::convertHexString2BitVec("18", 24, true, false, false);
     EXPECT_STREQ(Hex2Bit::convertBinData2HexString(padded->data(), 24, true, false), "000018");
 }
