@@ -150,6 +150,15 @@ public:
 
         if (flag("X4_READ") && number("STATUS_REGISTER_LENGTH") < 16)
             fail("STATUS_REGISTER_LENGTH", "must be at least 16 when X4_READ is set (the Quad Enable write sends two bytes)");
+        // The Quad Enable write sends register 1 and register 2 with one
+        // two-byte 01h and sets register 2 bit 1: a part that takes one byte
+        // there, or keeps Quad Enable elsewhere, would get a wrong register.
+        if (flag("X4_READ")) {
+            if (props_.count("WRSR_BITS") == 0 || number("WRSR_BITS") != 16)
+                fail("WRSR_BITS", "must be 16 when X4_READ is set (Quad Enable is written with a two-byte 01h)");
+            if (props_.count("QE_LOCATION") != 0 && text("QE_LOCATION") != "SR2.1")
+                fail("QE_LOCATION", "must be SR2.1 when X4_READ is set (Quad Enable is written as status register 2 bit 1)");
+        }
 
         checkOptional();
     }

@@ -115,6 +115,8 @@ const BadPart kBadParts[] = {
     {"x4 without two status bytes", "STATUS_REGISTER_LENGTH = 8\n", "STATUS_REGISTER_LENGTH"},
     {"negative wait", "WRSR_MAXWAITTIME = -1\n", "WRSR_MAXWAITTIME"},
     {"bad QE location", "QE_LOCATION = \"SR3.1\"\n", "QE_LOCATION"},
+    {"x4 with a one-byte status write", "WRSR_BITS = 8\n", "WRSR_BITS"},
+    {"x4 with Quad Enable in register 1", "QE_LOCATION = \"SR1.6\"\n", "QE_LOCATION"},
     {"float value", "PAGE_SIZE = 2048.0\n", "PAGE_SIZE"},
     {"malformed TOML", "PAGE_SIZE = = 3\n", "vendor.toml"},
 };
