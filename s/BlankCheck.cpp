@@ -39,8 +39,15 @@ bool Type1SPIDevice::blankCheck(int index, UT_CMDARGS* args) {
     if (deviceSize_ > 0) {
         do {
             bitsRead += pageSize_;
-            result &= readCommand.open(port(), address, "//Loading device with 'read' instruction.\n");
-            result &= port().shift(ScanStage::kCaptureClose, &capture, &pageOnes, &capture, &pageOnes);
+            bool read = readCommand.open(port(), address, "//Loading device with 'read' instruction.\n");
+            read = port().shift(ScanStage::kCaptureClose, &capture, &pageOnes, &capture, &pageOnes) && read;
+            // The capture starts all ones, so a page that was not read would
+            // pass for blank: it ends the check without a verdict.
+            if (!read) {
+                DEVICE_MESSAGE().issueError(
+                    "'%d': Blank check terminated, the page at address 0x%X could not be read.\n", index, address);
+                return false;
+            }
             if (capture.uniformValue() != 0xFFFFFFFFu) {
                 blank = false;
                 break;

@@ -21,7 +21,7 @@ bool Type1SPIDevice::erase(int index, UT_CMDARGS* args) {
     // A failed unlock is not fatal: protected memory shows up in the verify.
     if (useUnlockSr_) unlockStatusRegister(index, args);
 
-    bool result = spienable(index, args);
+    const bool enabled = spienable(index, args);
 
     // A recording cannot poll, so it waits the longest time the erase may take.
     const bool fileMode = port().outputMode();
@@ -37,25 +37,40 @@ bool Type1SPIDevice::erase(int index, UT_CMDARGS* args) {
 
     DEVICE_MESSAGE().issueStatus("'%d': Erasing Device.\n", index);
     port().comment("//Loading device with 'erase' instruction.\n");
-    result &= port().shift(ScanStage::kWhole, instruction.get(), &tdiMask, &tdo, &tdoMask);
-    result &= port().wait(fixedWait, true);
+    const bool sent = port().shift(ScanStage::kWhole, instruction.get(), &tdiMask, &tdo, &tdoMask) && enabled;
+    // Without its write enable or its instruction the flash never started
+    // erasing, and polling would find it idle at once.
+    if (!sent) {
+        DEVICE_MESSAGE().issueError("'%d': Erase did not start, the erase instruction could not be sent to the device.\n",
+                                    index);
+        spidisable(index, args);
+        return false;
+    }
+    const bool waited = port().wait(fixedWait, true);
 
     if (!fileMode && usesPolling()) {
-        result &= checkStatus(index, bulkEraseMaxWaitTime_, bulkEraseWaitTimeInc_);
-        if (!result) {
+        // Polling proves the end of the erase, whatever the fixed wait did.
+        if (!checkStatus(index, bulkEraseMaxWaitTime_, bulkEraseWaitTimeInc_)) {
             DEVICE_MESSAGE().issueError("'%d': Erase did not complete.\n", index);
             Port_MsgManData::debugStub("'%d': Device has exceeded the allocated time.\n", index);
             spidisable(index, args);
             return false;
         }
         port().isCancelled(2);  // the erase is complete; a cancel now changes nothing
+    } else if (!waited) {
+        // Nothing but the wait stands for the erase's end here.
+        DEVICE_MESSAGE().issueError("'%d': Erase did not complete, the wait for it failed.\n", index);
+        spidisable(index, args);
+        return false;
     }
 
-    if (result) {
-        // An erased flash is left in x1 mode: the Quad Enable bit is cleared.
-        if (switchGiven(args, "-qebit") || x4Read_) result = writeQuadEnableBit(index, args, false);
-        if (showRegisters) displayStatusRegisterBits(index);
+    bool result = true;
+    // An erased flash is left in x1 mode: the Quad Enable bit is cleared.
+    if (switchGiven(args, "-qebit") || x4Read_) {
+        result = writeQuadEnableBit(index, args, false);
+        if (!result) DEVICE_MESSAGE().issueError("'%d': The Quad Enable bit could not be cleared.\n", index);
     }
+    if (showRegisters) displayStatusRegisterBits(index);
 
     const bool disabled = spidisable(index, args);
     return disabled && result;

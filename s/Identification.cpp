@@ -36,11 +36,18 @@ bool Type1SPIDevice::readIdcode(int index, bool display) {
                       &instructionZeros) && ok;
     ok = port().shift(ScanStage::kCaptureClose, &idOnes, &idOnes, capture.get(), &idOnes) && ok;
 
+    // The capture was preloaded with the expected ID: after a failed read it
+    // holds that, not an answer of the flash.
+    if (!ok) {
+        if (display) DEVICE_MESSAGE().issueStatus("'%d': IDCODE could not be read.\n", index);
+        setAttribute(DeviceNS::ATTR_IDCODE, "", true);
+        return false;
+    }
     // The text belongs to the host's text pool.
     const char* idText = Hex2Bit::convertBinData2HexString(capture->data(), kIdCodeBits, true, false);
     if (display) DEVICE_MESSAGE().issueStatus("'%d': IDCODE is '%s' (in hex).\n", index, idText);
     setAttribute(DeviceNS::ATTR_IDCODE, idText, true);
-    return ok;
+    return true;
 }
 
 bool Type1SPIDevice::readElectronicSignature(int index, bool display) {
@@ -64,17 +71,20 @@ bool Type1SPIDevice::readElectronicSignature(int index, bool display) {
                       &signatureOnes) && ok;
     ok = port().wait(releaseFromStandbyMaxWaitTime_, true) && ok;
 
+    if (!ok) {
+        if (display) DEVICE_MESSAGE().issueStatus("'%d': Electronic signature could not be read.\n", index);
+        setAttribute(DeviceNS::ATTR_IDCODE, "", true);
+        return false;
+    }
     const char* signatureText =
         Hex2Bit::convertBinData2HexString(capture->data(), kSignatureBits, true, false);
     if (display) DEVICE_MESSAGE().issueStatus("'%d': IDCODE is '%s' (in hex).\n", index, signatureText);
     setAttribute(DeviceNS::ATTR_IDCODE, signatureText, true);
-    return ok;
+    return true;
 }
 
-// A failed read fails the check: the attribute then holds whatever the
-// capture vector was left with (the expected ID itself when nothing was
-// captured), so comparing it would report a flash that never answered as
-// the right one.
+// A failed read fails the check: a flash that never answered is never
+// taken for the right one.
 bool Type1SPIDevice::checkIdcode(int index) {
     const bool read = useRes_ ? readElectronicSignature(index, true) : readIdcode(index, true);
     if (!read) DEVICE_MESSAGE().issueStatus("Read ID Code failed.\n ");

@@ -54,7 +54,16 @@ bool Type1SPIDevice::program(int index, UT_CMDARGS* args) {
 
     bool result = true;
     if (useUnlockSr_) result = unlockStatusRegister(index, args);
-    if (switchGiven(args, "-e") || switchGiven(args, "-erase")) result = erase(index, args);
+    if (switchGiven(args, "-e") || switchGiven(args, "-erase")) {
+        result = erase(index, args);
+        // Pages written over data the erase left behind would hold neither
+        // the old contents nor the new.
+        if (!result) {
+            DEVICE_MESSAGE().issueError(
+                "'%d': Programming terminated, the erase did not complete; no page was written.\n", index);
+            return false;
+        }
+    }
 
     const std::size_t frameBits = static_cast<std::size_t>(totalShiftSize_);
     RLBitVec tdiMask(frameBits, true);
@@ -81,23 +90,35 @@ bool Type1SPIDevice::program(int index, UT_CMDARGS* args) {
         // reader's padded buffer.
         frame.updateBitField(chunk, dataStartIndex_, pageSize_, true);
 
-        result &= spienable(index, args);
+        // A page the port could not send is not in the flash: going on
+        // would end in a misleading time-out, or in a flash with a hole.
+        bool sent = spienable(index, args);
         port().comment("//Loading device with 'page program' instruction.\n");
-        result &= port().shift(ScanStage::kWhole, &frame, &tdiMask, &tdo, &tdoMask);
-        result &= port().wait(0, true);
-        if (fileMode) {
-            // A recording cannot poll: it waits the longest a page may take.
-            result &= port().wait(programMaxWaitTime_, true);
-        } else {
-            result &= port().wait(programWaitTime_, true);
-            if (usesPolling()) {
-                result &= checkStatus(index, programMaxWaitTime_, programWaitTimeInc_);
-                if (!result) {
-                    DEVICE_MESSAGE().issueError("'%d': Device has exceeded the allocated time.\n", index);
-                    spidisable(index, args);
-                    return false;
-                }
+        sent = port().shift(ScanStage::kWhole, &frame, &tdiMask, &tdo, &tdoMask) && sent;
+        sent = port().wait(0, true) && sent;
+        // A recording cannot poll: it waits the longest a page may take.
+        sent = port().wait(fileMode ? programMaxWaitTime_ : programWaitTime_, true) && sent;
+        if (!sent) {
+            DEVICE_MESSAGE().issueError(
+                "'%d': Programming terminated, the page at address 0x%X could not be sent to the device.\n",
+                index, address);
+            spidisable(index, args);
+            return false;
+        }
+        if (!fileMode && usesPolling() && !checkStatus(index, programMaxWaitTime_, programWaitTimeInc_)) {
+            if (lastPollEnd_ == PollEnd::ConnectionLost) {
+                DEVICE_MESSAGE().issueError(
+                    "'%d': Programming terminated at address 0x%X, the connection to the device was lost.\n",
+                    index, address);
+            } else if (lastPollEnd_ == PollEnd::Cancelled) {
+                // Cancelled while the page was still being written.
+                cancelled = true;
+                break;
+            } else {
+                DEVICE_MESSAGE().issueError("'%d': Device has exceeded the allocated time.\n", index);
             }
+            spidisable(index, args);
+            return false;
         }
         address += static_cast<unsigned>(addressStep);
         cancelled = port().isCancelled(2);

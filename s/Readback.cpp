@@ -76,12 +76,21 @@ bool Type1SPIDevice::readbackToFile(int index, UT_CMDARGS* args) {
     int fileOffset = 0;
     std::int64_t bitsCovered = 0;  // wide: a flash near 2^31 bits must not overflow the count
     bool cancelled = false;
+    bool pageFailed = false;
     if (deviceSize_ > 0) {
         // The last page is read whole even when it reaches past DEVICE_SIZE.
         do {
             bitsCovered += pageSize_;
-            result &= readCommand.open(port(), address, "//Loading device with 'read' instruction.\n");
-            result &= port().shift(ScanStage::kCaptureClose, &capture, &pageOnes, &capture, &pageOnes);
+            bool read = readCommand.open(port(), address, "//Loading device with 'read' instruction.\n");
+            read = port().shift(ScanStage::kCaptureClose, &capture, &pageOnes, &capture, &pageOnes) && read;
+            // A page that was not read would go into the file as a copy of
+            // the page before it.
+            if (!read) {
+                DEVICE_MESSAGE().issueError("'%d': Readback terminated, the page at address 0x%X could not be read.\n",
+                                            index, address);
+                pageFailed = true;
+                break;
+            }
             written &= writer->writeData(capture.data(), fileOffset, captureBits, 0);
             fileOffset += addressStep;
             address += static_cast<unsigned>(addressStep);
@@ -94,7 +103,9 @@ bool Type1SPIDevice::readbackToFile(int index, UT_CMDARGS* args) {
     // clean run is reported as a success.
     const bool stoppedEarly = cancelled && bitsCovered < deviceSize_;
     if (stoppedEarly) DEVICE_MESSAGE().issueStatus("'%d': Readback cancelled.\n", index);
-    if (!result) DEVICE_MESSAGE().issueError("'%d': Readback failed, a scan to the device did not succeed.\n", index);
+    if (!result && !pageFailed)
+        DEVICE_MESSAGE().issueError("'%d': Readback failed, a scan to the device did not succeed.\n", index);
+    result = result && !pageFailed;
     if (!written)
         DEVICE_MESSAGE().issueError("'%d': Readback failed, the file '%s' could not be written.\n", index,
                                     fileName);

@@ -6,6 +6,7 @@
 
 #include "host/Hex2Bit.h"
 #include "host/ScanPort.h"
+#include "host/Port_MsgManData.h"
 #include "host/UT_STR.h"
 
 namespace {
@@ -37,7 +38,10 @@ bool Type1SPIDevice::spidisable(int /*index*/, UT_CMDARGS* /*args*/) {
     return port().shiftWrite(ScanStage::kWhole, instruction.get(), 0);
 }
 
-VORANT_TYPE1SPINS::RESULT Type1SPIDevice::readStatus(int /*index*/, const char* bitName) {
+// A read that failed tells nothing about the flash, so it counts as busy:
+// taking it for idle would send the next write enable and page to a flash
+// still programming, which ignores both.
+VORANT_TYPE1SPINS::RESULT Type1SPIDevice::readStatus(int index, const char* bitName) {
     const std::size_t bits = readStatusInstruction_.length();
     RLBitVec capture(bits, false);
     const std::unique_ptr<RLBitVec> instruction = instructionFrame(readStatusInstruction_);
@@ -45,28 +49,48 @@ VORANT_TYPE1SPINS::RESULT Type1SPIDevice::readStatus(int /*index*/, const char* 
     RLBitVec zeros1(bits, false), zeros2(bits, false);
 
     port().comment("//Loading device with 'read status' instruction.\n");
-    // The shift results are not looked at: the answer rests on the capture.
-    port().shift(ScanStage::kOpen, instruction.get(), &ones1, &zeros1, &zeros2);
-    port().shift(ScanStage::kCaptureClose, &capture, &ones2, &capture, &ones3);
+    const bool opened = port().shift(ScanStage::kOpen, instruction.get(), &ones1, &zeros1, &zeros2);
+    const bool captured = port().shift(ScanStage::kCaptureClose, &capture, &ones2, &capture, &ones3);
+    const bool read = opened && captured;
+    if (!read) {
+        const char* reason = port().failureReason();
+        Port_MsgManData::debugStub("'%d': The status read failed (%s); the flash counts as busy.\n", index,
+                                   reason != nullptr ? reason : "no reason given");
+    }
 
-    if (UT_STR::ICompare(bitName, "wip") == 0)
+    if (UT_STR::ICompare(bitName, "wip") == 0) {
+        if (!read) return VORANT_TYPE1SPINS::WIP_SET;
         return capturedStatusBit(capture, 0) ? VORANT_TYPE1SPINS::WIP_SET : VORANT_TYPE1SPINS::NOT_SET;
+    }
+    // An unread latch is not known to be set.
     if (UT_STR::ICompare(bitName, "wel") == 0)
-        return capturedStatusBit(capture, 1) ? VORANT_TYPE1SPINS::WEL_SET : VORANT_TYPE1SPINS::NOT_SET;
+        return read && capturedStatusBit(capture, 1) ? VORANT_TYPE1SPINS::WEL_SET : VORANT_TYPE1SPINS::NOT_SET;
     return VORANT_TYPE1SPINS::NOT_SET;
 }
 
 // Reads first and waits only while the flash is busy, so a flash that is
 // already idle costs one read. The time-out is declared as soon as the
-// waits add up to more than maxWait, without a last read.
+// waits add up to more than maxWait, without a last read. A cable that is
+// gone ends the polling at once: every further read would fail as well.
 bool Type1SPIDevice::checkStatus(int index, int maxWait, int step) {
+    lastPollEnd_ = PollEnd::TimedOut;
     if (maxWait < 0) return false;
     long long elapsed = 0;  // wide, so adding steps can never overflow
     for (;;) {
-        if (readStatus(index, "WIP") == VORANT_TYPE1SPINS::NOT_SET) return true;
+        if (readStatus(index, "WIP") == VORANT_TYPE1SPINS::NOT_SET) {
+            lastPollEnd_ = PollEnd::Idle;
+            return true;
+        }
+        if (port().connectionLost()) {
+            lastPollEnd_ = PollEnd::ConnectionLost;
+            return false;
+        }
         port().wait(step, true);
         elapsed += step;
-        if (port().isCancelled(2)) return false;
+        if (port().isCancelled(2)) {
+            lastPollEnd_ = PollEnd::Cancelled;
+            return false;
+        }
         if (elapsed > maxWait) return false;
     }
 }

@@ -73,6 +73,11 @@ protected:
 private:
     void init(const char* partName);
 
+    // How the last checkStatus ended, so a caller can name the cause
+    // without asking the port again.
+    enum class PollEnd { Idle, TimedOut, Cancelled, ConnectionLost };
+    PollEnd lastPollEnd_ = PollEnd::Idle;
+
     // Polling switch: QRX_VORANT_ENV_DONT_USE_POLLING's text, not owned.
     const char* dontUsePolling_ = nullptr;
 

@@ -75,9 +75,16 @@ bool Type1SPIDevice::verify(int index, UT_CMDARGS* args, const char* operation) 
         reference = std::make_unique<RLBitVec>(bytes, static_cast<std::size_t>(delivered));
         capture = std::make_unique<RLBitVec>(bytes, static_cast<std::size_t>(delivered));
 
-        result &= readCommand.open(port(), address, "//Loading device with 'read ' instruction.\n");
-        result &= port().shift(ScanStage::kCaptureClose, capture.get(), &dataTdiMask, capture.get(),
-                               &dataTdoMask);
+        bool read = readCommand.open(port(), address, "//Loading device with 'read ' instruction.\n");
+        read = port().shift(ScanStage::kCaptureClose, capture.get(), &dataTdiMask, capture.get(), &dataTdoMask) &&
+               read;
+        // The capture starts as a copy of the file's page, so a page that was
+        // not read would compare equal: it ends the run without a verdict.
+        if (!read) {
+            DEVICE_MESSAGE().issueError("'%d': %s terminated, the page at address 0x%X could not be read.\n", index,
+                                        operationName, static_cast<unsigned>(readerAddress));
+            return false;
+        }
         address += static_cast<unsigned>(addressStep);
 
         if (checksumMode) {

@@ -208,11 +208,15 @@ TEST_P(Memory, BlankCheck) {
          .vectors = {{1, "1x32|0x32|0x32"}, {2, "1x64|1x64|1x64"}}},
         {.name = "a zero bit in the third page", .stream = withoutLast(blankReads(3)), .status = notBlank,
          .flip = 21, .value = "FALSE"},
-        // The first read command fails: the verdict stands, the result shows the failed read.
-        {.name = "not blank after a failed read", .result = 0, .stream = withoutLast(blankReads(3)),
-         .script = {.failShifts = {2}}, .status = notBlank, .flip = 21, .value = "FALSE"},
-        {"blank after a failed read", {}, 0, blankReads(4), {.failShifts = {3}}, {}, {start},
-         {"'0': Blank check failed, a scan to the device did not succeed.\n"}},
+        // A page that was not read ends the check without a verdict: its
+        // capture still holds the ones it started with.
+        {"failed read command", {}, 0, withoutLast(blankReads(1)), {.failShifts = {2}}, {}, {start},
+         {"'0': Blank check terminated, the page at address 0x0 could not be read.\n"}},
+        {"failed capture of the second page", {}, 0, withoutLast(blankReads(2)), {.failShifts = {5}}, {}, {start},
+         {"'0': Blank check terminated, the page at address 0x8 could not be read.\n"}},
+        // A failed write enable does not hide a verdict the reads reached.
+        {.name = "not blank after a failed write enable", .result = 0, .stream = withoutLast(blankReads(3)),
+         .script = {.failShifts = {1}}, .status = notBlank, .flip = 21, .value = "FALSE"},
         {"cancel after the first page", {}, 0, blankReads(1), {.cancelFrom = 1}, {},
          {start, "'0': Blank check cancelled.\n"}},
         {.name = "cancel after the last page", .stream = blankReads(4), .script = {.cancelFrom = 4}, .status = blank,
@@ -249,7 +253,12 @@ TEST_P(Memory, Readback) {
          {"'0': Readback terminated, the file 'locked.nowrite' cannot be written.\n"}, {}, {"-f", "locked.nowrite"}},
         {"PAGE_SIZE 0", {}, 0, kNoScan, {}, {{"PAGE_SIZE", "0"}}, {},
          {"'0': Readback terminated, PAGE_SIZE (0 bits) is smaller than one byte.\n"}, {}, out},
-        {.name = "failed read", .result = 0, .script = {.failShifts = {3}}, .status = {start},
+        // A page that was not read ends the readback: it would go into the
+        // file as a copy of the page before it.
+        {.name = "failed read", .result = 0, .script = {.failShifts = {5}}, .status = {start},
+         .errors = {"'0': Readback terminated, the page at address 0x8 could not be read.\n"}, .tokens = out,
+         .pages = 1},
+        {.name = "failed write enable", .result = 0, .script = {.failShifts = {1}}, .status = {start},
          .errors = {"'0': Readback failed, a scan to the device did not succeed.\n"}, .tokens = out, .pages = 4},
         {.name = "cancel after the first page", .result = 0, .script = {.cancelFrom = 1},
          .status = {start, "'0': Readback cancelled.\n"}, .tokens = out, .pages = 1},
