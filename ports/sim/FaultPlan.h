@@ -42,11 +42,23 @@ struct FaultPlan {
     // open transaction but lets no time pass.
     int failWaitAt = 0;
     bool failAllWaits = false;
-    // isCancelled answers false to the first cancelAfterQueries queries and
-    // true to every query after them (query cancelAfterQueries + 1 on).
-    // Negative: never. 0: from the first query. The plug-in asks once per
-    // page, so N means "cancel after N pages".
-    int cancelAfterQueries = -1;
+    // A page transaction is one that opens with the page-program, read or
+    // fast-read opcode and carries more than the opcode: one page written
+    // or read. Counted from 1 as they open.
+    //
+    // isCancelled answers true once cancelAfterPages page transactions have
+    // been made, as if the user pressed Ctrl-C right after that page.
+    // Negative: never. 0: from the first query.
+    int cancelAfterPages = -1;
+    // The shift that opens page transaction failShiftAtPage fails (0: none).
+    int failShiftAtPage = 0;
+    // The first wait after page transaction failWaitAtPage opened fails
+    // (0: none).
+    int failWaitAtPage = 0;
+    // The cable is lost at shift call disconnectAtShift: that call and
+    // every shift and wait after it fail, and connectionLost() answers true
+    // (0: never).
+    int disconnectAtShift = 0;
 };
 
 }  // namespace vorant::sim

@@ -484,4 +484,9 @@ void FlashModel::setStatus(std::uint8_t status1, std::uint8_t status2) {
     persistStatus();
 }
 
+bool FlashModel::movesPageData(std::uint8_t opcode) const {
+    const Command command = opcodes_[opcode].command;
+    return command == Command::PageProgram || command == Command::Read || command == Command::FastRead;
+}
+
 }  // namespace vorant::sim

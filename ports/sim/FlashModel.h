@@ -107,6 +107,9 @@ public:
     void setStatus(std::uint8_t status1, std::uint8_t status2);
 
     bool busy() const;
+    // true for the opcodes that write or read array data a page at a time
+    // (page program, read, fast read, in either address width).
+    bool movesPageData(std::uint8_t opcode) const;
     bool inDeepPowerDown() const;
     bool writeEnabled() const;
 

@@ -20,13 +20,39 @@ SimScanPort::SimScanPort(FlashConfig config, FaultPlan faults, const std::string
     : model_(std::move(config), faults, backingFile), faults_(std::move(faults)) {}
 
 bool SimScanPort::fail(const std::string& why) {
-    lastError_ = why;
+    lastError_ = "simulated cable: " + why;
     return false;
 }
 
-bool SimScanPort::shiftFails() {
-    return faults_.failAllShifts ||
-           (faults_.failShiftAt > 0 && stats_.shiftCalls == static_cast<std::uint64_t>(faults_.failShiftAt));
+bool SimScanPort::opensPageTransaction(int stage, const RLBitVec* tdi) const {
+    if ((stage != ScanStage::kWhole && stage != ScanStage::kOpen) || tdi == nullptr || tdi->length() <= 8)
+        return false;
+    return model_.movesPageData(kWireMirror[tdi->data()[0]]);
+}
+
+bool SimScanPort::shiftFails(int stage, const RLBitVec* tdi) {
+    const std::string call = "shift call " + std::to_string(stats_.shiftCalls);
+    if (faults_.disconnectAtShift > 0 && stats_.shiftCalls >= static_cast<std::uint64_t>(faults_.disconnectAtShift)) {
+        // The first failure says what happened; the ones after it follow.
+        if (!disconnected_) fail(call + " failed: the simulated cable was unplugged (injected fault)");
+        disconnected_ = true;
+        return true;
+    }
+    if (opensPageTransaction(stage, tdi)) {
+        ++pageTransactions_;
+        if (faults_.failWaitAtPage > 0 && pageTransactions_ == static_cast<std::uint64_t>(faults_.failWaitAtPage))
+            failWaitFromCall_ = stats_.waitCalls + 1;
+        if (faults_.failShiftAtPage > 0 && pageTransactions_ == static_cast<std::uint64_t>(faults_.failShiftAtPage)) {
+            fail(call + " (page transaction " + std::to_string(pageTransactions_) + ") failed (injected fault)");
+            return true;
+        }
+    }
+    if (faults_.failAllShifts ||
+        (faults_.failShiftAt > 0 && stats_.shiftCalls == static_cast<std::uint64_t>(faults_.failShiftAt))) {
+        fail(call + " failed (injected fault)");
+        return true;
+    }
+    return false;
 }
 
 void SimScanPort::openTransaction() {
@@ -42,13 +68,23 @@ void SimScanPort::closeTransaction() {
 }
 
 bool SimScanPort::shift(int stage, RLBitVec* tdi, RLBitVec*, RLBitVec* tdo, RLBitVec*) {
+    const bool ok = shiftOnce(stage, tdi, tdo);
+    lastCallFailed_ = !ok;
+    return ok;
+}
+
+bool SimScanPort::shiftOnce(int stage, RLBitVec* tdi, RLBitVec* tdo) {
     ++stats_.shiftCalls;
-    if (shiftFails()) return fail("shift call " + std::to_string(stats_.shiftCalls) + " failed (injected fault)");
+    if (shiftFails(stage, tdi)) return false;
     if (tdi == nullptr) return fail("shift without bits to drive");
     const bool continues = stage == ScanStage::kContinue || stage == ScanStage::kClose ||
                            stage == ScanStage::kCaptureClose;
-    if (continues && !open_)
+    if (continues && !open_) {
+        // The shift that should have opened the transaction failed: its
+        // reason is the one worth keeping.
+        if (lastCallFailed_) return false;
         return fail("shift stage " + std::to_string(stage) + " without an open transaction");
+    }
     try {
         switch (stage) {
         case ScanStage::kWhole:
@@ -83,7 +119,7 @@ bool SimScanPort::shiftWrite(int stage, RLBitVec* tdi, int) { return shift(stage
 
 bool SimScanPort::transaction(const RLBitVec& tdi, RLBitVec* captured) {
     ++stats_.shiftCalls;
-    if (shiftFails()) return fail("shift call " + std::to_string(stats_.shiftCalls) + " failed (injected fault)");
+    if (shiftFails(ScanStage::kWhole, &tdi)) return false;
     try {
         openTransaction();
         clock(tdi, captured);
@@ -101,8 +137,10 @@ bool SimScanPort::wait(int time, bool) {
     } catch (const std::exception& error) {
         return fail(error.what());
     }
+    if (disconnected_) return false;
     if (faults_.failAllWaits ||
-        (faults_.failWaitAt > 0 && stats_.waitCalls == static_cast<std::uint64_t>(faults_.failWaitAt)))
+        (faults_.failWaitAt > 0 && stats_.waitCalls == static_cast<std::uint64_t>(faults_.failWaitAt)) ||
+        stats_.waitCalls == failWaitFromCall_)
         return fail("wait call " + std::to_string(stats_.waitCalls) + " failed (injected fault)");
     if (time < 0) return fail("wait of a negative time (" + std::to_string(time) + " us)");
     model_.advance(static_cast<std::uint64_t>(time) * 1000u);
@@ -111,8 +149,7 @@ bool SimScanPort::wait(int time, bool) {
 
 bool SimScanPort::isCancelled(int) {
     ++stats_.cancelQueries;
-    if (faults_.cancelAfterQueries >= 0 &&
-        stats_.cancelQueries > static_cast<std::uint64_t>(faults_.cancelAfterQueries))
+    if (faults_.cancelAfterPages >= 0 && pageTransactions_ >= static_cast<std::uint64_t>(faults_.cancelAfterPages))
         return true;
     return cancel_.load();
 }

@@ -47,6 +47,8 @@ public:
     // negative time fails and lets no time pass.
     bool wait(int time, bool microseconds) override;
     bool isCancelled(int level) override;
+    const char* failureReason() override { return lastError_.empty() ? nullptr : lastError_.c_str(); }
+    bool connectionLost() override { return disconnected_; }
 
     // One whole transaction (select, shift, deselect) capturing MISO into
     // captured (may be null, may be tdi itself); counts as a shift call.
@@ -64,11 +66,16 @@ public:
     FlashModel& model() { return model_; }
     const FlashModel& model() const { return model_; }
     SimStats stats() const;
-    // Why the last failing call failed ("" when none has).
+    // Why the last failing call failed, "simulated cable: ..." ("" when
+    // none has).
     const std::string& lastError() const { return lastError_; }
 
 private:
-    bool shiftFails();
+    // Counts a page transaction when this opening shift starts one; true
+    // when an injected fault makes the shift fail (the reason recorded).
+    bool shiftFails(int stage, const RLBitVec* tdi);
+    bool opensPageTransaction(int stage, const RLBitVec* tdi) const;
+    bool shiftOnce(int stage, RLBitVec* tdi, RLBitVec* tdo);
     void openTransaction();
     void closeTransaction();
     void clock(const RLBitVec& tdi, RLBitVec* captured);
@@ -78,6 +85,10 @@ private:
     FaultPlan faults_;
     std::atomic<bool> cancel_{false};
     bool open_ = false;
+    bool disconnected_ = false;
+    bool lastCallFailed_ = false;  // the shift before this one failed
+    std::uint64_t pageTransactions_ = 0;
+    std::uint64_t failWaitFromCall_ = 0;  // the wait call that fails after the faulty page opened
     SimStats stats_;
     std::string lastError_;
 };
