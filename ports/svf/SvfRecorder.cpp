@@ -179,6 +179,12 @@ bool SvfRecorder::wait(int time, bool /*microseconds: always true*/) {
 
 bool SvfRecorder::isCancelled(int /*level*/) { return cancelRequested_.load() || file_.failed(); }
 
+const char* SvfRecorder::failureReason() {
+    if (!file_.failed()) return nullptr;
+    failureReason_ = file_.target().string() + " could not be written (is the disk full?)";
+    return failureReason_.c_str();
+}
+
 void SvfRecorder::addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBitVec* tdoMask) {
     const std::size_t bits = tdi.length();
     const std::size_t before = tdi_.size();

@@ -64,6 +64,10 @@ public:
     // True once requestCancel() was called, or when the file can no longer
     // be written (nothing more could be recorded).
     bool isCancelled(int level) override;
+    // Once the file cannot be written, every further call fails: the
+    // recording is as good as an unplugged cable.
+    const char* failureReason() override;
+    bool connectionLost() override { return file_.failed(); }
 
     // Cancel from another thread or a signal handler: requestCancel(), or
     // store true into cancelFlag() (lock-free).
@@ -105,6 +109,7 @@ private:
     std::atomic<bool> cancelRequested_{false};
     bool finished_ = false;
     SvfRecorderTotals totals_;
+    std::string failureReason_;
 };
 
 }  // namespace vorant::svf
