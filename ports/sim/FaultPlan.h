@@ -29,6 +29,10 @@ struct FaultPlan {
     // The chip powers up in deep power-down: only the release/signature
     // command is answered.
     bool startInDeepPowerDown = false;
+    // Status register writes are ignored, as on a chip whose write-protect
+    // pin is held low with its status register protected: the write is
+    // accepted on the wire and changes nothing.
+    bool statusWriteLocked = false;
 
     // --- The scan port (SimScanPort) ---
 

@@ -74,6 +74,7 @@ FlashModel::FlashModel(FlashConfig config, const FaultPlan& faults, const std::s
 
     stuckBits_ = faults.stuckBits;
     stuckBusy_ = faults.stuckBusy;
+    statusWriteLocked_ = faults.statusWriteLocked;
     if (faults.protectAtPowerOn) status1_ |= config_.blockProtectMask;
     poweredDown_ = faults.startInDeepPowerDown;
 }
@@ -373,7 +374,7 @@ void FlashModel::executeAtDeselect(bool onByteBoundary) {
         startBusy(config_.bulkEraseUs);
         return;
     case Command::WriteStatus: {
-        if (!onByteBoundary || dataBytes_ == 0) return;
+        if (!onByteBoundary || dataBytes_ == 0 || statusWriteLocked_) return;
         // Bytes beyond those the part takes are ignored.
         const auto writable1 = static_cast<std::uint8_t>(config_.status1WritableMask & ~(kWip | kWel));
         status1_ = static_cast<std::uint8_t>((status1_ & ~writable1) | (statusBytes_[0] & writable1));

@@ -154,6 +154,7 @@ private:
     std::unique_ptr<FlashFile> file_;
     std::vector<StuckBits> stuckBits_;
     bool stuckBusy_ = false;
+    bool statusWriteLocked_ = false;
 
     // Registers: status1_ holds WEL and the non-volatile bits; WIP is
     // derived from the busy state.
