@@ -1,6 +1,7 @@
 #include "cli/DeviceRun.h"
 
 #include "cli/CancelSignal.h"
+#include "cli/ChipChecks.h"
 #include "cli/ImageCheck.h"
 #include "cli/InstructionOpcode.h"
 #include "cli/PartIdentification.h"
@@ -8,6 +9,7 @@
 #include "cli/ProgressAwareSink.h"
 #include "cli/ProgressDisplay.h"
 #include "cli/ProgressPort.h"
+#include "cli/RunRefused.h"
 #include "cli/RunSummary.h"
 #include "cli/SameFile.h"
 #include "cli/SvfPlayback.h"
@@ -158,14 +160,58 @@ std::string joined(const std::vector<std::string>& names) {
     return text;
 }
 
-// Device attributes that carry the answer of some operations.
-void reportAnswer(Type1SPIDevice& device, const OperationInfo& info) {
-    if (info.operation != Operation::IdCode) return;
+// Device attributes that carry the answer of some operations. false when
+// the answer shows that no chip answered.
+bool reportAnswer(Type1SPIDevice& device, const OperationInfo& info) {
+    if (info.operation != Operation::IdCode) return true;
     const char* id = device.getAttribute(DeviceNS::ATTR_IDCODE);
-    if (id == nullptr) return;
+    if (id == nullptr || *id == '\0') return true;
+    if (!chipAnswered(id)) {
+        toolError(std::string("no chip answered the ID read (it read ") + id +
+                  "): check the connection, or wake a chip in deep power-down with 'release'");
+        return false;
+    }
     const std::vector<std::string> parts = ConstraintsManager::instance().partsWithId(id);
     toolInfo(parts.empty() ? std::string("No known part has the JEDEC ID ") + id + "."
                            : std::string("JEDEC ID ") + id + " belongs to: " + joined(parts) + ".");
+    return true;
+}
+
+// The byte a part's electronic signature read answers: RES_SIGNATURE, or
+// the IDCODE of a part identified by its signature; empty when the part has
+// no signature or no instruction to read it.
+std::string expectedSignature(const std::string& part) {
+    ConstraintsManager& database = ConstraintsManager::instance();
+    auto text = [&](const char* key) {
+        return database.hasProperty(part, key) ? std::string(database.getDeviceStringProperty(part.c_str(), key))
+                                               : std::string();
+    };
+    if (text("READSIGNATURE_INSTRUCTION").empty()) return {};
+    if (!text("RES_SIGNATURE").empty()) return text("RES_SIGNATURE");
+    if (UT_STR::ICompare(text("USE_RES").c_str(), "TRUE") == 0) return text("IDCODE");
+    return {};
+}
+
+void checkSignatureKnown(const std::string& part, const OperationInfo& info) {
+    if (info.operation == Operation::Signature && expectedSignature(part).empty())
+        throw RunRefused(part + " has no electronic signature to read (no RES_SIGNATURE or no "
+                                "READSIGNATURE_INSTRUCTION in its part entry); read its JEDEC ID with 'idcode'");
+}
+
+// What the tool checks on a cable before an operation that writes. With
+// --part auto the identification has already read the ID.
+WriteCheck writeCheckFor(Operation operation, bool identified) {
+    WriteCheck check;
+    switch (operation) {
+    case Operation::Program:
+    case Operation::Erase:
+        check.noBlockProtection = true;
+        [[fallthrough]];
+    case Operation::Unlock:
+    case Operation::QuadEnable: check.chipMustAnswer = !identified; break;
+    default: break;
+    }
+    return check;
 }
 
 // Everything a run needs before its first scan, checked in the order that
@@ -209,14 +255,53 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
             checkQuadEnableWritable(run.part, request);
             if (run.image) checkImageFits(*run.image, run.file, run.part);
         }
+        checkSignatureKnown(run.part, info);
         run.device = createDevice(run.part);
-    } catch (const UsageError&) {
+        // A recording has no chip to ask; its player checks.
+        if (!run.session->port().outputMode())
+            checkChipBeforeWrite(run.session->port(), run.part, writeCheckFor(info.operation, identification.has_value()));
+    } catch (...) {
         run.session->abandon();
         throw;
     }
     if (identification)
         toolInfo("Identified " + run.part + " by its JEDEC ID " + identification->jedecId + ".");
     return run;
+}
+
+// Whether the operation wrote Quad Enable, and to what: qe set|clear,
+// program leaving an x4 part in x4 mode, erase clearing it (with -qebit,
+// and always on a part with X4_READ).
+std::optional<bool> quadEnableWritten(const OperationRequest& request, Type1SPIDevice& device,
+                                      const std::string& part) {
+    const auto& tokens = request.switchTokens;
+    const bool qebit = std::find(tokens.begin(), tokens.end(), "-qebit") != tokens.end();
+    ConstraintsManager& database = ConstraintsManager::instance();
+    const bool x4Part = database.hasProperty(part, "X4_READ") &&
+                        UT_STR::ICompare(database.getDeviceStringProperty(part.c_str(), "X4_READ"), "TRUE") == 0;
+    switch (request.info->operation) {
+    case Operation::QuadEnable: return request.operands.at(0) == "set";
+    case Operation::Program:
+        if (device.x4Programming()) return true;
+        return std::nullopt;
+    case Operation::Erase:
+        if (qebit || x4Part) return false;
+        return std::nullopt;
+    default: return std::nullopt;
+    }
+}
+
+// The signature read against the part's: the answer of 'signature'.
+bool signatureMatches(Type1SPIDevice& device, const std::string& part) {
+    const std::string expected = expectedSignature(part);
+    const char* read = device.getAttribute(DeviceNS::ATTR_IDCODE);
+    const std::string got = read != nullptr ? read : "";
+    if (UT_STR::ICompare(got.c_str(), expected.c_str()) == 0) {
+        toolInfo("Electronic signature " + got + " is " + part + "'s.");
+        return true;
+    }
+    toolError("the electronic signature read is " + got + ", but " + part + "'s is " + expected);
+    return false;
 }
 
 // A recording appears only when the operation succeeded; otherwise it is
@@ -252,6 +337,17 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         device.setAttribute(DeviceNS::ATTR_DATA_WIDTH, std::to_string(*options.dataWidth).c_str(), true);
     UT_CMDARGS args = request.deviceArguments();
 
+    // Without polling nothing on the cable proves that a page or an erase
+    // finished: say so before the run, not after it.
+    const bool writes = info.operation == Operation::Program || info.operation == Operation::Erase;
+    if (writes && !device.usesPolling() && !run.session->port().outputMode())
+        toolInfo("Busy polling is off (QRX_VORANT_ENV_DONT_USE_POLLING is set): program and erase only wait their "
+                 "fixed times, and only -v can prove the result.");
+    // The status lines of these operations are their answer: --quiet keeps them.
+    const bool answers = info.operation == Operation::IdCode || info.operation == Operation::Signature ||
+                         info.operation == Operation::Status;
+    if (options.quiet && answers) sink.setQuiet(false);
+
     CancelSignal cancelSignal;
     ProgressPort progressPort(run.session->port(), progressPlan(device, info, args, run.part, run.image.get()),
                               &CancelSignal::flag());
@@ -274,15 +370,30 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         toolError(std::string("the operation stopped: ") + error.what());
         result = false;
     }
-    // A cancel the operation saw is a cancel, whatever it returned: some
-    // operations end a cancelled run on their success path.
-    // The recorder also answers a cancel query once its file can no longer
-    // be written (a full disk): that run failed, nobody cancelled it.
-    const bool writeFailed =
-        run.session->recorder() != nullptr && progressPort.cancelSeen() && !CancelSignal::requested();
-    const bool cancelled = progressPort.cancelSeen() && !writeFailed;
-    if (writeFailed) toolError(options.port.file + " could not be written (is the disk full?)");
-    result = result && !writeFailed;
+    // Every operation that stops early for a cancel returns false; one that
+    // saw the cancel only after its last page (or after an erase that no
+    // cancel can stop) finished its job, and its result stands.
+    // A port that lost its cable (a recorder whose file can no longer be
+    // written also answers cancel queries) failed the run; nobody cancelled it.
+    const bool portLost = progressPort.connectionLost();
+    const bool cancelled = progressPort.cancelSeen() && !portLost && !result;
+    result = result && !portLost;
+    // The port's own words for what went wrong: the device's messages name
+    // only what it could see (a time-out, an erase that did not complete).
+    if (!result && !cancelled) {
+        if (const char* reason = progressPort.failureReason()) toolError(reason);
+    }
+    if (result && !cancelled && !run.session->port().outputMode()) {
+        try {
+            if (const std::optional<bool> qe = quadEnableWritten(request, device, run.part))
+                checkQuadEnableAfterWrite(run.session->port(), run.part, *qe);
+        } catch (const RunRefused& problem) {
+            toolError(problem.what());
+            result = false;
+        }
+    }
+    if (result && info.operation == Operation::Signature) result = signatureMatches(device, run.part);
+    if (options.quiet && answers) sink.setQuiet(true);
 
     RunFigures figures;
     figures.operation = std::string(info.name);
@@ -301,7 +412,10 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         status = isBlank ? kExitSuccess : kExitFailure;
         figures.verdict = isBlank ? "found the flash blank" : "found the flash not blank";
     }
-    if (status == kExitSuccess) reportAnswer(device, info);
+    if (status == kExitSuccess && !reportAnswer(device, info)) {
+        status = kExitFailure;
+        figures.outcome = RunOutcome::Failed;
+    }
 
     if (display) {
         if (status == kExitSuccess) display->complete();

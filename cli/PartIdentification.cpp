@@ -1,5 +1,6 @@
 #include "cli/PartIdentification.h"
 
+#include "cli/RunRefused.h"
 #include "cli/UsageError.h"
 #include "host/ConstraintsManager.h"
 #include "host/VorantException.h"
@@ -39,8 +40,12 @@ std::string joined(const std::vector<std::string>& names) {
 
 }  // namespace
 
+bool chipAnswered(const std::string& jedecId) {
+    return jedecId.find_first_not_of("Ff") != std::string::npos && jedecId.find_first_not_of('0') != std::string::npos;
+}
+
 std::string identificationProblem(const std::string& jedecId, const std::vector<std::string>& matches) {
-    if (jedecId.find_first_not_of("Ff") == std::string::npos || jedecId.find_first_not_of('0') == std::string::npos)
+    if (!chipAnswered(jedecId))
         return "no chip answered the JEDEC ID read (it read " + jedecId +
                "); check the connection, wake a chip in deep power-down with "
                "'vorant-spi --part NAME release', or name the part with --part NAME";
@@ -58,14 +63,21 @@ Identification identifyPart(ScanPort& port, int index) {
     reader->setScanPort(&port);
     const bool read = reader->readIdcode(index, false);
     const char* id = reader->getAttribute(DeviceNS::ATTR_IDCODE);
-    if (!read || id == nullptr || *id == '\0')
-        throw UsageError("the JEDEC ID could not be read over the port; name the part with --part NAME");
+    if (!read || id == nullptr || *id == '\0') {
+        const char* reason = port.failureReason();
+        throw RunRefused(std::string("the JEDEC ID could not be read over the port") +
+                         (reason != nullptr ? std::string(": ") + reason : std::string()));
+    }
 
     Identification identification;
     identification.jedecId = id;
     const std::vector<std::string> matches = ConstraintsManager::instance().partsWithId(identification.jedecId);
-    if (const std::string problem = identificationProblem(identification.jedecId, matches); !problem.empty())
+    if (const std::string problem = identificationProblem(identification.jedecId, matches); !problem.empty()) {
+        // A chip that does not answer is a failed run; an answer the
+        // database cannot place asks the user to name the part.
+        if (!chipAnswered(identification.jedecId)) throw RunRefused(problem);
         throw UsageError(problem);
+    }
     identification.partName = matches.front();
     return identification;
 }

@@ -14,9 +14,13 @@ struct Identification {
 // --part auto: reads the JEDEC ID over the port with a device built for a
 // part that reads it with 9Fh (every shipped part does, so any of them can
 // ask whatever chip answers) and returns the one part that has that ID.
-// Throws UsageError, listing what matched, when no chip answers, no part
-// has the ID, or several do.
+// Throws RunRefused when no chip answers (or the read fails), UsageError,
+// listing what matched, when no part has the ID or several do.
 Identification identifyPart(ScanPort& port, int index);
+
+// false for the IDs a bus without an answering chip reads: all ones or all
+// zeros.
+bool chipAnswered(const std::string& jedecId);
 
 // The message for an ID and the parts that have it; empty when exactly one
 // does. Exposed for tests.

@@ -17,6 +17,7 @@ public:
     void receive(const Message& message) override;
     // The bar to keep tidy (not owned); null when none is shown.
     void setDisplay(ProgressDisplay* display) { display_ = display; }
+    void setQuiet(bool quiet) { console_.setQuiet(quiet); }
 
 private:
     vorant::ConsoleSink console_;

@@ -43,6 +43,8 @@ public:
     bool shiftWrite(int stage, RLBitVec* tdi, int reserved) override;
     bool wait(int time, bool microseconds) override;
     bool isCancelled(int level) override;
+    const char* failureReason() override { return inner_.failureReason(); }
+    bool connectionLost() override { return inner_.connectionLost(); }
 
     long long stepsDone() const { return done_; }
     long long totalSteps() const { return plan_.totalSteps; }

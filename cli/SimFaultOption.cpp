@@ -11,8 +11,9 @@ namespace vorant::cli {
 namespace {
 
 constexpr const char* kFaultList =
-    "stuck-busy, cancel-after=N, stuck-bit=ADDR:MASK[:VALUE], protected, deep-power-down, fail-shift=N, "
-    "fail-wait=N";
+    "stuck-busy, cancel-after=N, stuck-bit=ADDR:MASK[:VALUE], protected, deep-power-down, status-locked, "
+    "fail-shift=N, "
+    "fail-shift=page:N, fail-wait=N, fail-wait=page:N, disconnect=N";
 
 // A decimal or 0x-prefixed hexadecimal number no larger than `limit`.
 std::optional<std::uint64_t> parseNumber(const std::string& text, std::uint64_t limit) {
@@ -69,6 +70,21 @@ sim::StuckBits stuckBitsArgument(const std::string& text, const std::string& val
     return stuck;
 }
 
+// A call count from 1, or with "page:" a page-transaction count from 1.
+struct FaultCount {
+    int at = 0;
+    bool pages = false;
+};
+
+FaultCount faultCount(const std::string& text, const std::string& value) {
+    const std::string pagePrefix = "page:";
+    FaultCount count;
+    count.pages = value.rfind(pagePrefix, 0) == 0;
+    count.at = countArgument(text, count.pages ? value.substr(pagePrefix.size()) : value);
+    if (count.at == 0) badFault(text, "counts from 1");
+    return count;
+}
+
 }  // namespace
 
 void addSimFault(sim::FaultPlan& plan, const std::string& text) {
@@ -77,24 +93,29 @@ void addSimFault(sim::FaultPlan& plan, const std::string& text) {
     const bool hasValue = equals != std::string::npos;
     const std::string value = hasValue ? text.substr(equals + 1) : std::string();
 
-    const bool takesValue =
-        name == "cancel-after" || name == "stuck-bit" || name == "fail-shift" || name == "fail-wait";
+    const bool takesValue = name == "cancel-after" || name == "stuck-bit" || name == "fail-shift" ||
+                            name == "fail-wait" || name == "disconnect";
     if (takesValue && !hasValue) badFault(text, "needs a value after '='");
     if (!takesValue && hasValue &&
-        (name == "stuck-busy" || name == "protected" || name == "deep-power-down"))
+        (name == "stuck-busy" || name == "protected" || name == "deep-power-down" || name == "status-locked"))
         badFault(text, "takes no value");
 
     if (name == "stuck-busy") plan.stuckBusy = true;
     else if (name == "protected") plan.protectAtPowerOn = true;
     else if (name == "deep-power-down") plan.startInDeepPowerDown = true;
-    else if (name == "cancel-after") plan.cancelAfterQueries = countArgument(text, value);
+    else if (name == "status-locked") plan.statusWriteLocked = true;
+    else if (name == "cancel-after") plan.cancelAfterPages = countArgument(text, value);
     else if (name == "stuck-bit") plan.stuckBits.push_back(stuckBitsArgument(text, value));
     else if (name == "fail-shift") {
-        plan.failShiftAt = countArgument(text, value);
-        if (plan.failShiftAt == 0) badFault(text, "counts from 1");
+        const FaultCount count = faultCount(text, value);
+        (count.pages ? plan.failShiftAtPage : plan.failShiftAt) = count.at;
     } else if (name == "fail-wait") {
-        plan.failWaitAt = countArgument(text, value);
-        if (plan.failWaitAt == 0) badFault(text, "counts from 1");
+        const FaultCount count = faultCount(text, value);
+        (count.pages ? plan.failWaitAtPage : plan.failWaitAt) = count.at;
+    } else if (name == "disconnect") {
+        const FaultCount count = faultCount(text, value);
+        if (count.pages) badFault(text, "counts shift calls");
+        plan.disconnectAtShift = count.at;
     } else
         badFault(text, "unknown fault");
 }

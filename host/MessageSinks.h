@@ -14,6 +14,9 @@ class VORANT_HOST_API ConsoleSink : public MessageSink {
 public:
     ConsoleSink(std::FILE* out, std::FILE* err, bool showDebug, bool quiet = false);
     void receive(const Message& message) override;
+    // --quiet hides status and info lines; an operation whose status lines
+    // are its answer (an ID, the registers) shows them all the same.
+    void setQuiet(bool quiet) { quiet_ = quiet; }
 
 private:
     std::FILE* out_;

@@ -1,0 +1,94 @@
+#include "cli/ChipChecks.h"
+
+#include "cli/ChipProbe.h"
+#include "cli/RunRefused.h"
+#include "host/ConstraintsManager.h"
+#include "host/UT_STR.h"
+
+#include <cstdint>
+#include <cstdio>
+
+namespace vorant::cli {
+
+namespace {
+
+constexpr int kIdBytes = 3;
+constexpr unsigned kQuadEnableBit = 1;  // bit 1 of status register 2
+
+std::string partText(const std::string& part, const char* key) {
+    ConstraintsManager& database = ConstraintsManager::instance();
+    return database.hasProperty(part, key) ? database.getDeviceStringProperty(part.c_str(), key) : "";
+}
+
+bool partFlag(const std::string& part, const char* key) {
+    return UT_STR::ICompare(partText(part, key).c_str(), "TRUE") == 0;
+}
+
+std::string portReason(ScanPort& port) {
+    const char* reason = port.failureReason();
+    return reason != nullptr ? std::string(": ") + reason : std::string();
+}
+
+bool allBytesAre(const std::vector<std::uint8_t>& bytes, std::uint8_t value) {
+    for (std::uint8_t byte : bytes)
+        if (byte != value) return false;
+    return true;
+}
+
+void checkChipAnswers(ChipProbe& probe, ScanPort& port, const std::string& part) {
+    const auto id = probe.read(partText(part, "IDENTIFICATION_INSTRUCTION"), kIdBytes);
+    if (!id) throw RunRefused("the chip's ID could not be read" + portReason(port) + "; nothing was written");
+    // A chip in deep power-down, or none at all, leaves MISO at one level.
+    if (allBytesAre(*id, 0xFF) || allBytesAre(*id, 0x00))
+        throw RunRefused("no chip answered the ID read (it read " + hexText(*id) +
+                         "): check the connection, or wake a chip in deep power-down with 'vorant-spi --part " +
+                         part + " release'; nothing was written");
+}
+
+// The status register 1 bits the part labels BP0, BP1, ...
+std::string setBlockProtectBits(const std::string& part, std::uint8_t status) {
+    std::string names;
+    for (int bit = 7; bit >= 0; --bit) {
+        const std::string label = partText(part, ("STATUS_LOCATION_" + std::to_string(bit)).c_str());
+        if (UT_STR::IMatch(label.c_str(), "BP*") == 0 || ((status >> bit) & 1u) == 0) continue;
+        names += (names.empty() ? "" : ", ") + label;
+    }
+    return names;
+}
+
+void checkNoBlockProtection(ChipProbe& probe, ScanPort& port, const std::string& part) {
+    const auto status = probe.readRegister(partText(part, "READSTATUS_INSTRUCTION"));
+    if (!status)
+        throw RunRefused("status register 1 could not be read" + portReason(port) + "; nothing was written");
+    const std::string names = setBlockProtectBits(part, *status);
+    if (names.empty()) return;
+    char value[8];
+    std::snprintf(value, sizeof value, "0x%02X", static_cast<unsigned>(*status));
+    throw RunRefused("the chip is write-protected: " + names + " set in status register 1 (" + value +
+                     "), so erase and program would change nothing; clear them with 'vorant-spi --part " + part +
+                     " unlock'; nothing was written");
+}
+
+}  // namespace
+
+void checkChipBeforeWrite(ScanPort& port, const std::string& part, const WriteCheck& check) {
+    ChipProbe probe(port);
+    if (check.chipMustAnswer) checkChipAnswers(probe, port, part);
+    if (check.noBlockProtection && !partFlag(part, "USE_UNLOCKSR")) checkNoBlockProtection(probe, port, part);
+}
+
+void checkQuadEnableAfterWrite(ScanPort& port, const std::string& part, bool expectedSet) {
+    ChipProbe probe(port);
+    const auto status2 = probe.readRegister(partText(part, "READSTATUS2_INSTRUCTION"));
+    if (!status2)
+        throw RunRefused("status register 2 could not be read back to check Quad Enable" + portReason(port));
+    const bool set = ((*status2 >> kQuadEnableBit) & 1u) != 0;
+    if (set == expectedSet) return;
+    char value[8];
+    std::snprintf(value, sizeof value, "0x%02X", static_cast<unsigned>(*status2));
+    throw RunRefused(std::string("Quad Enable was to be ") + (expectedSet ? "set" : "cleared") +
+                     " but status register 2 reads " + value + " (QE " + (set ? "set" : "clear") +
+                     ") after the write");
+}
+
+}  // namespace vorant::cli
