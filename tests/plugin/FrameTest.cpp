@@ -60,6 +60,14 @@ TEST_P(Frame, CommandLayer) {
         {"Wel of 0x02", bit("Wel"), 2, read, {.status1 = 0x02}},
         {"wel of 0xFD", bit("wel"), 0, read, {.status1 = 0xFD}},
         {"'wip ' of 0x03", bit("wip "), 0, read, {.status1 = 0x03}},
+        // A read that failed tells nothing: the flash counts as busy, and
+        // its latch is not known to be set.
+        {"wip of a failed read", bit("wip"), 1, read, {.failShifts = {2}}},
+        {"wel of a failed read", bit("wel"), 0, read, {.failShifts = {1}, .status1 = 0x02}},
+        {"polling goes on past a failed read", poll(10, 5), 1, concat({busyPoll(5), read}), {.failShifts = {2}}},
+        {"polling, a failed read to the end", poll(10, 5), 0, repeat(busyPoll(5), 3), {.failShifts = {1, 3, 5}}},
+        // A lost cable ends the polling at its first failed read.
+        {"polling, lost cable", poll(1000, 5), 0, read, {.failShifts = {1}, .failureLosesCable = true}},
         {"polling, limit 0, idle", poll(0, 5), 1, read},
         {"polling, limit 0, busy", poll(0, 5), 0, busyPoll(5), {.busyReads = 99}},
         {"polling 10/5, busy", poll(10, 5), 0, repeat(busyPoll(5), 3), {.busyReads = 99}},

@@ -62,6 +62,26 @@ TEST_P(Memory, Erase) {
         {.name = "time-out", .result = 0,
          .stream = concat({eraseStart(40000000), repeat(busyPoll(4000000), 3), writeDisable()}),
          .script = {.busyReads = 99}, .changes = all, .status = start, .errors = notComplete, .debug = exceeded},
+        // Without its instruction the flash never started: no polling, which
+        // would find it idle at once.
+        {.name = "erase instruction not sent", .result = 0,
+         .stream = concat({withoutLast(eraseStart(40000000)), writeDisable()}),
+         .script = {.failShifts = {2}}, .status = start,
+         .errors = {"'0': Erase did not start, the erase instruction could not be sent to the device.\n"}},
+        {.name = "write enable not sent", .result = 0, .stream = concat({withoutLast(eraseStart(40000000)), writeDisable()}),
+         .script = {.failShifts = {1}}, .status = start,
+         .errors = {"'0': Erase did not start, the erase instruction could not be sent to the device.\n"}},
+        // With polling off only the wait stands for the erase's end.
+        {.name = "failed wait without polling", .result = 0, .stream = concat({eraseStart(40000000), writeDisable()}),
+         .script = {.failWaits = {1}}, .status = start,
+         .errors = {"'0': Erase did not complete, the wait for it failed.\n"}, .noPolling = true},
+        // With polling, the polling proves the end whatever the wait did.
+        {"failed wait, idle at the poll", {}, 1, concat({eraseStart(40000000), kIdlePoll, writeDisable()}),
+         {.failWaits = {1}}, {}, start},
+        {.name = "Quad Enable not cleared", .result = 0,
+         .stream = concat({eraseStart(300000000), quadEnableWrite(0x1C, 0x00, true), writeDisable()}),
+         .script = {.fileMode = true, .failWaits = {2}, .status1 = 0x1C, .status2 = 0x02}, .changes = x4,
+         .status = start, .errors = {"'0': The Quad Enable bit could not be cleared.\n"}},
         // The Quad Enable bit cleared, register 1 written back as read.
         {"-qebit", {}, 1, cleared, qe, {}, start, {}, {}, {"-qebit"}},
         {"X4_READ", {}, 1, cleared, qe, x4, start},
@@ -142,6 +162,35 @@ TEST_P(Memory, Program) {
         {"time-out", {}, 0, concat({page(0, concat({{"wait 700"}, repeat(busyPoll(70), 3)})), writeDisable()}),
          {.busyReads = 99}, {{"PROGRAM_MAXWAITTIME", "140"}}, {x1[0]},
          {"'0': Device has exceeded the allocated time.\n"}, {}, {}, 16},
+        // A page the port could not send ends the run at once, naming it.
+        {.name = "page not sent", .result = 0, .stream = concat({page(0, {"wait 700"}), writeDisable()}),
+         .script = {.failShifts = {2}}, .status = {x1[0]},
+         .errors = {"'0': Programming terminated, the page at address 0x0 could not be sent to the device.\n"},
+         .dataBytes = 16},
+        {.name = "second page's wait failed", .result = 0,
+         .stream = concat({page(0, concat({{"wait 700"}, kIdlePoll})), page(1, {"wait 700"}), writeDisable()}),
+         .script = {.failWaits = {4}}, .status = {x1[0]},
+         .errors = {"'0': Programming terminated, the page at address 0x8 could not be sent to the device.\n"},
+         .dataBytes = 16},
+        // A lost cable ends the polling, and the run, at once.
+        {.name = "lost cable while polling", .result = 0,
+         .stream = concat({page(0, concat({{"wait 700"}, statusRead()})), writeDisable()}),
+         .script = {.failShifts = {3}, .failureLosesCable = true}, .status = {x1[0]},
+         .errors = {"'0': Programming terminated at address 0x0, the connection to the device was lost.\n"},
+         .dataBytes = 16},
+        // A cancel while a page is still busy: cancelled, not timed out.
+        {.name = "cancel while polling", .result = 0,
+         .stream = concat({page(0, concat({{"wait 700"}, busyPoll(70)})), writeDisable()}),
+         .script = {.cancelFrom = 1, .busyReads = 99}, .status = {x1[0], "'0': Programming cancelled.\n"},
+         .dataBytes = 16},
+        // A failed erase: no page is written over what it left.
+        {.name = "failed erase", .result = 0,
+         .stream = concat({eraseStart(40000000), repeat(busyPoll(4000000), 3), writeDisable()}),
+         .script = {.busyReads = 99},
+         .changes = {{"BULKERASE_MAXWAITTIME", "8000000"}}, .status = {"'0': Erasing Device.\n"},
+         .errors = {"'0': Erase did not complete.\n",
+                    "'0': Programming terminated, the erase did not complete; no page was written.\n"},
+         .tokens = {"-e"}, .dataBytes = 16},
         // A cancel between pages: no further page, no verify, no x4 step, but the write disable.
         {"cancel", programWidth("4", 0), 0, onePage, {.fileMode = true, .cancelFrom = 1}, x4,
          {x1[0], "'0': Programming cancelled.\n"}, {}, {}, {"-v"}, 24},

@@ -153,6 +153,7 @@ struct PortScript {
     bool fileMode = false;
     std::vector<int> failShifts{}, failWaits{};
     int cancelFrom = 0;
+    bool failureLosesCable = false;
     int busyReads = 0;
     unsigned status1 = 0, status2 = 0;
 };
@@ -295,6 +296,7 @@ protected:
         port.failingShifts = row.script.failShifts;
         port.failingWaits = row.script.failWaits;
         port.cancelFromQuery = row.script.cancelFrom;
+        port.failureLosesCable = row.script.failureLosesCable;
         MemoryImage image(data, row.base);
         image.reportedBits = row.reportedBits;
         if (row.dataBytes >= 0) device->setConfigData(&image);

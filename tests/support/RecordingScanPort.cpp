@@ -13,7 +13,12 @@ std::string bitsOf(const RLBitVec& vector) {
 
 bool RecordingScanPort::record(const std::string& line, const std::vector<int>& failing, int& calls) {
     events.push_back({.line = line});
-    return std::find(failing.begin(), failing.end(), ++calls) == failing.end();
+    const bool ok = std::find(failing.begin(), failing.end(), ++calls) == failing.end();
+    if (!ok) {
+        failed_ = true;
+        lost_ = lost_ || failureLosesCable;
+    }
+    return ok;
 }
 
 bool RecordingScanPort::outputMode() {

@@ -41,6 +41,9 @@ public:
     bool shiftWrite(int stage, RLBitVec* tdi, int reserved) override;
     bool wait(int time, bool microseconds) override;
     bool isCancelled(int level) override;
+    // Not logged: they put nothing on the wire.
+    const char* failureReason() override { return failed_ ? "scripted failure" : nullptr; }
+    bool connectionLost() override { return lost_; }
 
     // Scripting.
     bool fileMode = false;
@@ -50,6 +53,9 @@ public:
     std::vector<int> failingShifts, failingWaits;
     // isCancelled answers true from this 1-based query on (0: never).
     int cancelFromQuery = 0;
+    // The first failing shift or wait takes the cable with it:
+    // connectionLost() answers true from then on.
+    bool failureLosesCable = false;
 
     // The log.
     std::vector<ScanEvent> events;
@@ -60,6 +66,7 @@ private:
     // Logs a call; true unless its number is listed as failing.
     bool record(const std::string& line, const std::vector<int>& failing, int& calls);
     int shiftCalls_ = 0, waitCalls_ = 0, cancelQueries_ = 0;
+    bool failed_ = false, lost_ = false;
     std::string openingTdi_;  // the tdi of the shift that opened the current transaction
 };
 
