@@ -147,6 +147,20 @@ TEST_F(ToolTest, SignatureWorksOnEveryShippedPart) {
     EXPECT_TRUE(has(other.err, "the electronic signature read is 15, but W25Q16JV's is 14")) << other.text();
 }
 
+// The simulated Ctrl-C comes after N pages, whatever else asked for a
+// cancel before them (the erase's polls do).
+TEST_F(ToolTest, CancelAfterNPagesLeavesNPages) {
+    const std::string image = randomBytes(8 * 256, 9);
+    write("image.bin", image);
+    const Result result = run(Args{"--part", "W25Q16JV", "--port", "sim:flash.sim", "--sim-fault", "cancel-after=3",
+                                   "program", "image.bin", "-e"});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_TRUE(has(result.out, "'0': Programming cancelled.")) << result.text();
+    const std::string flash = flashBytes(read("flash.sim"));
+    EXPECT_TRUE(flash.substr(0, 3 * 256) == image.substr(0, 3 * 256));
+    EXPECT_TRUE(flash.substr(3 * 256) == std::string(kSimBytes - 3 * 256, '\xff'));
+}
+
 // --quiet keeps the answer of the operations whose output is an answer.
 TEST_F(ToolTest, QuietStillAnswers) {
     EXPECT_TRUE(has(ok(Args{"--quiet", "--part", "W25Q16JV", "idcode"}).out, "IDCODE is 'EF4015'"));
