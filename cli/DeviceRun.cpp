@@ -3,6 +3,7 @@
 #include "cli/CancelSignal.h"
 #include "cli/ImageCheck.h"
 #include "cli/InstructionOpcode.h"
+#include "cli/OutputSettlement.h"
 #include "cli/PartIdentification.h"
 #include "cli/PortSession.h"
 #include "cli/ProgressAwareSink.h"
@@ -224,8 +225,10 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
 void finishRecording(PortSession& session, const std::string& target, int& status, RunFigures& figures) {
     if (session.recorder() == nullptr) return;
     if (status != kExitSuccess) {
+        const bool streamed = !session.recorder()->replacesTarget();
         session.abandon();
-        toolInfo("Nothing was recorded: " + target + " is written only when the operation succeeds.");
+        toolInfo(streamed ? streamedOutputNote(target, "recording")
+                          : "Nothing was recorded: " + target + " is written only when the operation succeeds.");
         return;
     }
     try {
@@ -310,8 +313,7 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         progressPort.setListener(nullptr);
     }
     finishRecording(*run.session, options.port.file, status, figures);
-    if (cancelled && info.operation == Operation::Readback)
-        toolInfo(run.file + " holds only the pages read before the cancel.");
+    settleOutputFiles(info, run.file, status, figures);
 
     if (!options.quiet) {
         printRunSummary(figures);

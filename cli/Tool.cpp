@@ -8,6 +8,7 @@
 #include "cli/SvfPlayback.h"
 #include "cli/UsageError.h"
 #include "host/MessageSinks.h"
+#include "host/OutputTarget.h"
 
 #include <cstdio>
 #include <exception>
@@ -58,6 +59,16 @@ int guarded(Step&& step) {
     }
 }
 
+// Whether the run's data go to standard output ("-f -", "--port svf:-",
+// or a name for the file standard output already is).
+bool dataOnStandardOutput(const CommandLine& command) {
+    const OperationInfo* info = command.request.info;
+    if (info != nullptr && info->operation == Operation::Readback &&
+        isStandardOutputTarget(command.request.fileOperand()))
+        return true;
+    return !command.options.port.isSimulator() && isStandardOutputTarget(command.options.port.file);
+}
+
 }  // namespace
 
 int runTool(int argc, char** argv) {
@@ -73,7 +84,10 @@ int runTool(int argc, char** argv) {
     case CommandLine::Action::Run: break;
     }
 
-    ProgressAwareSink sink(stdout, stderr, command.options.debug, command.options.quiet);
+    // Status lines must not mix with data on standard output: they go to
+    // stderr for such a run.
+    std::FILE* statusStream = dataOnStandardOutput(command) ? stderr : stdout;
+    ProgressAwareSink sink(statusStream, stderr, command.options.debug, command.options.quiet);
     vorant::ScopedSink installed(&sink);
     return guarded([&] {
         const int status = runOperation(command, sink);

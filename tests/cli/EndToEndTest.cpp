@@ -85,7 +85,7 @@ TEST_F(ToolTest, RunsGiveTheirExitStatusAndAFileFlashKeepsItsContents) {
         {kSim + Args{"--sim-fault", "cancel-after=2", "blankcheck"}, 1, "vorant-spi: cancelled by the user"},
         {kSim + Args{"--quiet", "verify", "image.bin"}, 1, "vorant-spi: verify failed"},
         {kSim + Args{"--sim-fault", "cancel-after=3", "readback", "-f", "part.bin"}, 1,
-         "INFO: part.bin holds only the pages read before the cancel."},
+         "INFO: Nothing was written: part.bin is written only when the readback succeeds."},
         // A recorded verify played on an erased flash: every compared read mismatches.
         {{"--part", "W25Q16JV", "--port", "svf:verify.svf", "verify", "image.bin"}, 0, "recorded to verify.svf"},
         {{"--part", "W25Q16JV", "play", "verify.svf"}, 1, "ERROR: verify.svf: line "},
