@@ -10,6 +10,7 @@
 #include "host/MessageSinks.h"
 #include "host/OutputTarget.h"
 
+#include <csignal>
 #include <cstdio>
 #include <exception>
 
@@ -69,9 +70,19 @@ bool dataOnStandardOutput(const CommandLine& command) {
     return !command.options.port.isSimulator() && isStandardOutputTarget(command.options.port.file);
 }
 
+// A reader that goes away (`vorant-spi program ... | head -1`) must not end
+// the run between erase and program: writes to it then just fail, the job
+// goes on, and the exit status tells how it went.
+void ignoreBrokenPipes() {
+#ifndef _WIN32
+    std::signal(SIGPIPE, SIG_IGN);
+#endif
+}
+
 }  // namespace
 
 int runTool(int argc, char** argv) {
+    ignoreBrokenPipes();
     CommandLine command;
     const int parsed = guarded([&] {
         command = parseCommandLine(std::vector<std::string>(argv + (argc > 0 ? 1 : 0), argv + argc));

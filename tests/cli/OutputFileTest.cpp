@@ -1,7 +1,7 @@
 // Output files that never destroy anything: a readback or a recording
 // replaces its file only when the run succeeded; links are written through,
 // devices, FIFOs and standard output are written in place and stay what
-// they are.
+// they are; a reader that goes away does not stop a job half-way.
 #include "ToolTestFixture.h"
 
 #include <sys/stat.h>
@@ -141,6 +141,20 @@ TEST_F(OutputFiles, RecordingThroughALinkReplacesItsTargetOnlyWhenItSucceeds) {
     EXPECT_TRUE(fs::is_symlink(dir / "job.svf"));
     EXPECT_TRUE(read("jobs/real.svf") == read("plain.svf"));
     EXPECT_EQ(leftovers({"image.bin", "jobs", "jobs/real.svf", "job.svf", "plain.svf"}), Args{});
+}
+
+TEST_F(OutputFiles, AClosedStandardOutputDoesNotStopAJobHalfWay) {
+    const std::string image = randomBytes(70001, 31);
+    write("image.bin", image);
+    int ends[2];
+    ASSERT_EQ(pipe2(ends, O_CLOEXEC), 0);
+    close(ends[0]);  // the reader is gone before the first line: every write to stdout fails
+    Child tool(kSim + Args{"program", "image.bin", "-e", "-v"}, dir, root, RLIM_INFINITY, ends[1]);
+    close(ends[1]);
+    const Result result = tool.finish();
+    EXPECT_EQ(result.status, 0) << result.text();
+    EXPECT_TRUE(has(result.err, "vorant-spi: program succeeded")) << result.text();
+    ok(kSim + Args{"verify", "image.bin"});
 }
 
 }  // namespace
