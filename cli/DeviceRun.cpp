@@ -258,6 +258,7 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     CancelSignal cancelSignal;
     ProgressPort progressPort(run.session->port(), progressPlan(device, info, args, run.part, run.image.get()),
                               &CancelSignal::flag());
+    progressPort.setPhaseClock(run.session->phaseClock());
     device.setScanPort(&progressPort);
 
     std::optional<ProgressDisplay> display;
@@ -292,6 +293,8 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     figures.wallSeconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - started).count();
     figures.simulatedNanoseconds = run.session->simulatedNanoseconds();
     figures.bytes = progressPort.dataBytes();
+    const bool compares = info.operation == Operation::Program || info.operation == Operation::Verify;
+    figures.phases = progressPort.phaseFigures(compares ? "verify" : "read");
     figures.outcome = cancelled ? RunOutcome::Cancelled : result ? RunOutcome::Succeeded : RunOutcome::Failed;
 
     int status = result && !cancelled ? kExitSuccess : kExitFailure;
