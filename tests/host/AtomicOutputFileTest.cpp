@@ -7,6 +7,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -25,9 +26,10 @@ std::string contents(const fs::path& file) {
 class AtomicOutput : public ::testing::Test {
 protected:
     void SetUp() override {
-        folder = fs::temp_directory_path() / ("vorant-atomic-" + std::to_string(::testing::UnitTest::GetInstance()->random_seed()));
-        fs::remove_all(folder);
-        fs::create_directories(folder);
+        // A folder of its own: ctest runs these tests side by side.
+        std::string name = (fs::temp_directory_path() / "vorant-atomic-XXXXXX").string();
+        ASSERT_NE(mkdtemp(name.data()), nullptr);
+        folder = name;
         std::ofstream(folder / "old.bin") << "earlier contents";
     }
     void TearDown() override {
