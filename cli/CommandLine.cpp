@@ -2,6 +2,7 @@
 
 #include "cli/SimFaultOption.h"
 #include "cli/UsageError.h"
+#include "cli/WholeNumberOption.h"
 #include "host/UT_STR.h"
 
 #include <CLI/CLI.hpp>
@@ -30,6 +31,12 @@ std::string operationsHelp() {
             "  svf:FILE     record the scans as SVF into FILE; the file appears only when the\n"
             "               operation succeeds (a failed or cancelled run leaves no file and\n"
             "               leaves an existing FILE untouched)\n"
+            "\nReadback files (readback -f FILE):\n"
+            "  FILE appears only when the readback succeeds: a failed or cancelled readback\n"
+            "  leaves no file and leaves an existing FILE untouched. Through a symbolic link\n"
+            "  the file it points to is replaced. A FIFO or a device is written as the data\n"
+            "  come. '-' writes raw binary to standard output; the status lines then go to\n"
+            "  stderr.\n"
             "\nPart database:\n"
             "  The shipped part files are loaded from the first folder that exists of\n"
             "    1. $VORANT_PARTS_DIR (when set, it must be a folder),\n"
@@ -66,9 +73,11 @@ struct ParsedValues {
     std::string port = "sim";
     std::string chip;
     std::vector<std::string> partFiles;
-    long long index = 0;
-    long long dataWidth = 0;
-    long long clockHz = 0;
+    // Numbers are kept as typed: CLI11 would clamp a number too large for
+    // its type, and the message must quote what the user gave.
+    std::string index = "0";
+    std::string dataWidth;
+    std::string clockHz;
     bool dataWidthGiven = false, clockGiven = false;
     bool debug = false, quiet = false, version = false;
     std::vector<std::string> simFaults;
@@ -152,20 +161,17 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.port = parsePortChoice(values.port);
     if (!values.chip.empty()) options.chip = values.chip;
     options.partFiles = values.partFiles;
-    if (values.index < 0 || values.index > kMaxIndex)
-        throw UsageError("--index " + std::to_string(values.index) + " is out of range; give 0 to " +
-                         std::to_string(kMaxIndex));
-    options.index = static_cast<int>(values.index);
+    options.index = static_cast<int>(
+        wholeNumberOption("--index", values.index, 0, kMaxIndex, "give 0 to " + std::to_string(kMaxIndex)));
     if (values.dataWidthGiven) {
-        if (values.dataWidth != 1 && values.dataWidth != 4)
-            throw UsageError("--data-width " + std::to_string(values.dataWidth) + " is not supported; give 1 or 4");
-        options.dataWidth = static_cast<int>(values.dataWidth);
+        const long long width = wholeNumberOption("--data-width", values.dataWidth, 1, 4, "give 1 or 4");
+        if (width != 1 && width != 4)
+            throw UsageError("--data-width " + values.dataWidth + " is not supported; give 1 or 4");
+        options.dataWidth = static_cast<int>(width);
     }
     if (values.clockGiven) {
-        if (values.clockHz < 1 || values.clockHz > kMaxClockHz)
-            throw UsageError("--clock " + std::to_string(values.clockHz) + " is out of range; give 1 to " +
-                             std::to_string(kMaxClockHz) + " Hz");
-        options.clockHz = static_cast<std::uint32_t>(values.clockHz);
+        options.clockHz = static_cast<std::uint32_t>(wholeNumberOption(
+            "--clock", values.clockHz, 1, kMaxClockHz, "give 1 to " + std::to_string(kMaxClockHz) + " Hz"));
     }
     options.debug = values.debug;
     options.quiet = values.quiet;

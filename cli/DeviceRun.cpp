@@ -4,6 +4,7 @@
 #include "cli/ChipChecks.h"
 #include "cli/ImageCheck.h"
 #include "cli/InstructionOpcode.h"
+#include "cli/OutputSettlement.h"
 #include "cli/PartIdentification.h"
 #include "cli/PortSession.h"
 #include "cli/ProgressAwareSink.h"
@@ -309,8 +310,10 @@ bool signatureMatches(Type1SPIDevice& device, const std::string& part) {
 void finishRecording(PortSession& session, const std::string& target, int& status, RunFigures& figures) {
     if (session.recorder() == nullptr) return;
     if (status != kExitSuccess) {
+        const bool streamed = !session.recorder()->replacesTarget();
         session.abandon();
-        toolInfo("Nothing was recorded: " + target + " is written only when the operation succeeds.");
+        toolInfo(streamed ? streamedOutputNote(target, "recording")
+                          : "Nothing was recorded: " + target + " is written only when the operation succeeds.");
         return;
     }
     try {
@@ -351,6 +354,7 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     CancelSignal cancelSignal;
     ProgressPort progressPort(run.session->port(), progressPlan(device, info, args, run.part, run.image.get()),
                               &CancelSignal::flag());
+    progressPort.setPhaseClock(run.session->phaseClock());
     device.setScanPort(&progressPort);
 
     std::optional<ProgressDisplay> display;
@@ -400,6 +404,8 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     figures.wallSeconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - started).count();
     figures.simulatedNanoseconds = run.session->simulatedNanoseconds();
     figures.bytes = progressPort.dataBytes();
+    const bool compares = info.operation == Operation::Program || info.operation == Operation::Verify;
+    figures.phases = progressPort.phaseFigures(compares ? "verify" : "read");
     figures.outcome = cancelled ? RunOutcome::Cancelled : result ? RunOutcome::Succeeded : RunOutcome::Failed;
 
     int status = result && !cancelled ? kExitSuccess : kExitFailure;
@@ -424,8 +430,7 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         progressPort.setListener(nullptr);
     }
     finishRecording(*run.session, options.port.file, status, figures);
-    if (cancelled && info.operation == Operation::Readback)
-        toolInfo(run.file + " holds only the pages read before the cancel.");
+    settleOutputFiles(info, run.file, status, figures);
 
     if (!options.quiet) {
         printRunSummary(figures);

@@ -4,7 +4,9 @@
 #include "cli/UsageError.h"
 #include "formats/ConfigDataFiles.h"
 #include "formats/FormatError.h"
+#include "host/AtomicOutputFile.h"
 #include "host/ConstraintsManager.h"
+#include "host/VorantException.h"
 
 #include <cstdint>
 
@@ -29,10 +31,9 @@ void checkImageFits(ConfigDataReader& image, const std::string& path, const std:
 
 void checkReadbackTarget(const std::string& path) {
     try {
-        // Destroyed unfinished: the writer removes its temporary file and
-        // the target is not touched.
-        formats::openConfigDataWriter(path);
-    } catch (const formats::FormatError& error) {
+        // Opens nothing: a FIFO's reader would take the close for the end.
+        AtomicOutputFile::checkWritable(path);
+    } catch (const VorantException& error) {
         throw UsageError(std::string(error.what()) + "; choose a file in a folder that exists and can be written");
     }
 }

@@ -26,7 +26,7 @@ std::vector<OperationInfo> buildCatalog() {
         {O::BlankCheck, "blankcheck", "blankcheck", "check that the flash is erased (exit 0: blank)",
          K::None, {}, true, true, "blankcheck"},
         {O::Readback, "readback", "readback -f FILE",
-         "read the whole flash into FILE (format from its extension)", K::None, {kFile, kFileLong},
+         "read the whole flash into FILE (format from its extension; - for standard output)", K::None, {kFile, kFileLong},
          true, false, "readbacktofile"},
         {O::IdCode, "idcode", "idcode", "read and show the 24-bit JEDEC ID", K::None, {}, true, false,
          ""},

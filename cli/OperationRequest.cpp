@@ -2,6 +2,8 @@
 
 #include "cli/UsageError.h"
 
+#include <algorithm>
+
 namespace vorant::cli {
 
 namespace {
@@ -71,6 +73,10 @@ OperationRequest parseOperationTokens(const OperationInfo& info, const std::vect
         }
         const SwitchInfo* sw = findSwitch(info, token);
         if (sw == nullptr) throw UsageError("unknown switch '" + token + "': " + acceptedSwitches(info));
+        // The device would quietly take the first of two file names.
+        if (sw->takesFileName && std::find(request.switchTokens.begin(), request.switchTokens.end(), token) !=
+                                     request.switchTokens.end())
+            throw UsageError("'" + token + "' is given twice; give one file name (" + usageOf(info) + ")");
         request.switchTokens.push_back(token);
         if (sw->takesFileName) {
             if (i + 1 >= tokens.size() || looksLikeSwitch(tokens[i + 1]) || tokens[i + 1].empty())

@@ -5,6 +5,7 @@
 #include "host/VorantException.h"
 #include "ports/svf/SvfError.h"
 
+#include <chrono>
 #include <filesystem>
 #include <system_error>
 
@@ -56,6 +57,14 @@ ScanPort& PortSession::port() {
 std::optional<std::uint64_t> PortSession::simulatedNanoseconds() const {
     if (!simulator_) return std::nullopt;
     return simulator_->stats().simulatedNs;
+}
+
+PhaseTimer::Clock PortSession::phaseClock() const {
+    if (simulator_) {
+        const sim::SimScanPort* simulator = simulator_.get();
+        return [simulator] { return static_cast<double>(simulator->stats().simulatedNs) / 1e9; };
+    }
+    return [] { return std::chrono::duration<double>(std::chrono::steady_clock::now().time_since_epoch()).count(); };
 }
 
 void PortSession::commit() {

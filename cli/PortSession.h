@@ -1,5 +1,6 @@
 #pragma once
 #include "cli/CommandLine.h"
+#include "cli/PhaseTimer.h"
 #include "host/ScanPort.h"
 #include "ports/sim/SimScanPort.h"
 #include "ports/svf/SvfRecorder.h"
@@ -28,6 +29,9 @@ public:
 
     // Simulated bus time so far; nothing for a recording.
     std::optional<std::uint64_t> simulatedNanoseconds() const;
+    // The clock a run's phases are timed by, as its rate is: the simulated
+    // bus time, or the wall clock for a recording.
+    PhaseTimer::Clock phaseClock() const;
 
     // Completes a recording: the file appears under its name. Throws
     // svf::SvfError when it could not be written; for the simulator there

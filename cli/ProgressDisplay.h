@@ -1,5 +1,6 @@
 #pragma once
 #include "cli/ProgressListener.h"
+#include "cli/TerminalWidth.h"
 
 #include <chrono>
 #include <cstdio>
@@ -10,6 +11,8 @@ namespace vorant::cli {
 // A one-line progress bar (or, without a total, a spinner) redrawn in place
 // on a terminal stream. Redraws are limited to visible changes and a few
 // per second, so a fast simulated run is not slowed down by its display.
+// The line fits the terminal's width and follows a resize: a line longer
+// than the terminal would wrap, and every redraw would add a line.
 class ProgressDisplay final : public ProgressListener {
 public:
     ProgressDisplay(std::FILE* stream, std::string label);
@@ -26,13 +29,18 @@ public:
     // Leaves the line as it is (failure or cancel).
     void stop();
 
-    // The line for a state, without the carriage return; exposed for tests.
-    static std::string render(const std::string& label, long long done, long long total, int frame);
+    // The line for a state on a terminal `columns` wide, without the
+    // carriage return. It takes at most columns - 1 columns (the last one
+    // would wrap on some terminals): the bar shrinks to fit, then the label
+    // goes, then the bar; the percentage always stays, even where it does
+    // not fit (a terminal of fewer than five columns).
+    static std::string render(const std::string& label, long long done, long long total, int frame, int columns);
 
 private:
     void draw(bool force);
 
     std::FILE* stream_;
+    TerminalWidth width_;
     std::string label_;
     long long done_ = 0;
     long long total_ = 0;

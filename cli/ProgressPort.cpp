@@ -20,7 +20,7 @@ bool ProgressPort::shift(int stage, RLBitVec* tdi, RLBitVec* tdiMask, RLBitVec* 
     if (capturesPage) {
         readCommandOpen_ = false;
         ++pagesRead_;
-        if (tdo != nullptr) dataBytes_ += tdo->length() / 8;
+        if (tdo != nullptr) readBytes_ += tdo->length() / 8;
         advance(1);
     }
     return ok;
@@ -62,18 +62,33 @@ void ProgressPort::observeOpening(int stage, const RLBitVec* tdi) {
 
     if (stage == ScanStage::kOpen) {
         readCommandOpen_ = opcode == plan_.readOpcode;
+        if (readCommandOpen_) phases_.enter(RunPhase::Read);
         return;
     }
     // A bare instruction is one byte; a page program carries address and data.
     if (opcode == plan_.pageProgramOpcode && tdi->length() > 8) {
+        phases_.enter(RunPhase::Program);
         ++pagesProgrammed_;
-        dataBytes_ += plan_.pageBytes;
+        programmedBytes_ += plan_.pageBytes;
         advance(1);
     } else if (opcode == plan_.bulkEraseOpcode) {
+        phases_.enter(RunPhase::Erase);
         eraseRunning_ = true;
         eraseWaitedUs_ = 0;
         eraseStepsCounted_ = 0;
     }
+}
+
+std::vector<PhaseFigures> ProgressPort::phaseFigures(const std::string& readName) const {
+    std::vector<PhaseFigures> figures;
+    const auto add = [&](const char* name, RunPhase phase, std::uint64_t bytes) {
+        const double seconds = phases_.seconds(phase);
+        if (seconds > 0 || bytes > 0) figures.push_back({name, seconds, bytes});
+    };
+    add("erase", RunPhase::Erase, 0);
+    add("program", RunPhase::Program, programmedBytes_);
+    add(readName.c_str(), RunPhase::Read, readBytes_);
+    return figures;
 }
 
 void ProgressPort::endErase() {

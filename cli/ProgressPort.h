@@ -1,11 +1,16 @@
 #pragma once
+#include "cli/PhaseTimer.h"
 #include "cli/ProgressListener.h"
+#include "cli/RunSummary.h"
 #include "host/ScanPort.h"
 
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <string>
+#include <utility>
+#include <vector>
 
 namespace vorant::cli {
 
@@ -28,6 +33,11 @@ struct ProgressPlan {
 // PROGRESS_ERASE_WAITTIME_INC waited, the erase's remaining steps when it
 // ends. Steps never pass the total.
 //
+// Given a clock, it also splits the run's time among erase, program and
+// read by the same transactions: a bulk erase opens the erase (its busy
+// polls belong to it), the first page program the program, the first read
+// command the read; each lasts until another begins.
+//
 // It also answers cancel queries: true once the user asked (a flag a signal
 // handler may set) or the real port says so, and remembers that it did, so
 // the tool can tell a cancelled run from a finished one.
@@ -36,6 +46,8 @@ public:
     ProgressPort(ScanPort& inner, ProgressPlan plan, const std::atomic<bool>* userCancel = nullptr);
 
     void setListener(ProgressListener* listener) { listener_ = listener; }
+    // Starts timing the phases by `clock` (see PhaseTimer).
+    void setPhaseClock(PhaseTimer::Clock clock) { phases_ = PhaseTimer(std::move(clock)); }
 
     bool outputMode() override;
     void comment(const char* text) override;
@@ -52,7 +64,10 @@ public:
     std::uint64_t pagesProgrammed() const { return pagesProgrammed_; }
     std::uint64_t pagesRead() const { return pagesRead_; }
     // Data bytes moved by page programs and page reads.
-    std::uint64_t dataBytes() const { return dataBytes_; }
+    std::uint64_t dataBytes() const { return programmedBytes_ + readBytes_; }
+    // Erase, program and read, in that order, as far as they took time or
+    // moved data; the read is called `readName` ("verify", "read").
+    std::vector<PhaseFigures> phaseFigures(const std::string& readName) const;
 
 private:
     void observeOpening(int stage, const RLBitVec* tdi);
@@ -72,7 +87,9 @@ private:
     long long eraseStepsCounted_ = 0;
     std::uint64_t pagesProgrammed_ = 0;
     std::uint64_t pagesRead_ = 0;
-    std::uint64_t dataBytes_ = 0;
+    std::uint64_t programmedBytes_ = 0;
+    std::uint64_t readBytes_ = 0;
+    PhaseTimer phases_;
 };
 
 }  // namespace vorant::cli

@@ -47,7 +47,15 @@ std::string runSummaryLine(const RunFigures& figures) {
         rateSeconds = simulated;
         rateBasis = "simulated";
     }
-    if (figures.bytes > 0) {
+    if (!figures.phases.empty()) {
+        std::string breakdown;
+        for (const PhaseFigures& phase : figures.phases) {
+            breakdown += (breakdown.empty() ? "" : ", ") + phase.name + " " + secondsText(phase.seconds);
+            if (phase.bytes > 0 && phase.seconds > 0)
+                breakdown += " at " + rateText(static_cast<double>(phase.bytes) / phase.seconds);
+        }
+        line += " (" + breakdown + ")";
+    } else if (figures.bytes > 0) {
         line += ", " + std::to_string(figures.bytes) + " bytes";
         if (rateSeconds > 0)
             line += " at " + rateText(static_cast<double>(figures.bytes) / rateSeconds) + " (" + rateBasis + ")";

@@ -9,7 +9,9 @@
 #include "cli/SvfPlayback.h"
 #include "cli/UsageError.h"
 #include "host/MessageSinks.h"
+#include "host/OutputTarget.h"
 
+#include <csignal>
 #include <cstdio>
 #include <exception>
 
@@ -62,9 +64,29 @@ int guarded(Step&& step) {
     }
 }
 
+// Whether the run's data go to standard output ("-f -", "--port svf:-",
+// or a name for the file standard output already is).
+bool dataOnStandardOutput(const CommandLine& command) {
+    const OperationInfo* info = command.request.info;
+    if (info != nullptr && info->operation == Operation::Readback &&
+        isStandardOutputTarget(command.request.fileOperand()))
+        return true;
+    return !command.options.port.isSimulator() && isStandardOutputTarget(command.options.port.file);
+}
+
+// A reader that goes away (`vorant-spi program ... | head -1`) must not end
+// the run between erase and program: writes to it then just fail, the job
+// goes on, and the exit status tells how it went.
+void ignoreBrokenPipes() {
+#ifndef _WIN32
+    std::signal(SIGPIPE, SIG_IGN);
+#endif
+}
+
 }  // namespace
 
 int runTool(int argc, char** argv) {
+    ignoreBrokenPipes();
     CommandLine command;
     const int parsed = guarded([&] {
         command = parseCommandLine(std::vector<std::string>(argv + (argc > 0 ? 1 : 0), argv + argc));
@@ -77,7 +99,10 @@ int runTool(int argc, char** argv) {
     case CommandLine::Action::Run: break;
     }
 
-    ProgressAwareSink sink(stdout, stderr, command.options.debug, command.options.quiet);
+    // Status lines must not mix with data on standard output: they go to
+    // stderr for such a run.
+    std::FILE* statusStream = dataOnStandardOutput(command) ? stderr : stdout;
+    ProgressAwareSink sink(statusStream, stderr, command.options.debug, command.options.quiet);
     vorant::ScopedSink installed(&sink);
     return guarded([&] {
         const int status = runOperation(command, sink);

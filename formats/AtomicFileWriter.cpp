@@ -1,14 +1,26 @@
 #include "formats/AtomicFileWriter.h"
 
 #include "formats/FormatError.h"
+#include "host/PendingOutputs.h"
 #include "host/VorantException.h"
 
-namespace vorant::formats {
+#include <cerrno>
+#include <cstring>
 
-AtomicFileWriter::AtomicFileWriter(const std::string& target) try : file_(target) {
-} catch (const VorantException& error) {
-    throw FormatError(error.what());
+namespace vorant::formats {
+namespace {
+
+std::unique_ptr<AtomicOutputFile> openOutput(const std::string& target) {
+    try {
+        return std::make_unique<AtomicOutputFile>(target);
+    } catch (const VorantException& error) {
+        throw FormatError(error.what());
+    }
 }
+
+}  // namespace
+
+AtomicFileWriter::AtomicFileWriter(const std::string& target) : target_(target), file_(openOutput(target)) {}
 
 bool AtomicFileWriter::beginWrite() {
     if (ended_) return fail(targetName() + ": beginWrite after endWrite");
@@ -23,7 +35,9 @@ bool AtomicFileWriter::fail(const std::string& reason) {
 
 bool AtomicFileWriter::checkStream() {
     if (out()) return true;
-    return fail(targetName() + ": write failed (disk full?)");
+    // Called right after the write, so errno still says why it failed
+    // (a full disk, a FIFO whose reader went away).
+    return fail(targetName() + ": write failed (" + (errno != 0 ? std::strerror(errno) : "disk full?") + ")");
 }
 
 bool AtomicFileWriter::acceptData(const unsigned char* data, int offset, int bits, std::size_t& byteCount) {
@@ -43,11 +57,12 @@ bool AtomicFileWriter::endWrite() {
     if (ended_) return fail(targetName() + ": endWrite called twice");
     ended_ = true;
     if (failed_ || !finishData() || !checkStream()) {
-        file_.discard();
+        file_->discard();
         return false;
     }
     std::string error;
-    if (!file_.commit(error)) return fail(error);
+    if (!file_->close(error)) return fail(error);
+    PendingOutputs::add(std::move(file_));
     return true;
 }
 

@@ -25,6 +25,10 @@ bool BinaryWriter::writeData(const unsigned char* data, int offset, int bits, in
     if (!acceptData(data, offset, bits, count)) return false;
     if (count == 0) return true;
     const auto start = static_cast<std::uint64_t>(offset);
+    if (start < length_ && !seekable()) {
+        return fail(targetName() + ": data at offset " + std::to_string(start) +
+                    " arrive below data already written; a stream takes data in ascending order");
+    }
     if (start > length_) {
         if (!fillTo(start)) return false;
     } else if (start != position_) {

@@ -9,7 +9,8 @@ namespace vorant::formats {
 // Writes a readback as a raw binary file: flash byte k at file offset k.
 // Captured bytes are bit-reversed back to flash bytes. Data may arrive at
 // any offset: a gap before new data is filled with 0xFF (what erased flash
-// reads), data below the end overwrite what is there.
+// reads), data below the end overwrite what is there (not on a stream such
+// as a FIFO or standard output, which takes data in ascending order only).
 class BinaryWriter final : public AtomicFileWriter {
 public:
     // Throws FormatError when path cannot be written; creates nothing then.

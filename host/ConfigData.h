@@ -44,7 +44,9 @@ public:
     virtual bool beginWrite() = 0;
     // bits of captured data at a flash byte offset; reserved is 0.
     virtual bool writeData(const unsigned char* data, int offset, int bits, int reserved) = 0;
-    // Completes the file. A writer destroyed before endWrite leaves no file
+    // Completes the file. The host's writers leave it complete but
+    // unpublished (PendingOutputs): the host publishes it when the whole
+    // operation succeeded. A writer destroyed before endWrite leaves no file
     // under the final name.
     virtual bool endWrite() = 0;
 };

@@ -83,6 +83,9 @@ public:
 
     const SvfRecorderTotals& totals() const { return totals_; }
     const std::filesystem::path& target() const { return file_.target(); }
+    // False when the target is not a regular file (a FIFO, a device,
+    // standard output): it is written as the recording goes.
+    bool replacesTarget() const { return file_.replacesTarget(); }
 
     // Hex digits per line of a wrapped value.
     static constexpr std::size_t kDigitsPerLine = 128;

@@ -66,6 +66,18 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
             {"--part", "W25Q16JV", "--port", "svf:old.svf", "program", "big.bin"}, 2, "big.bin"},
     BadCase{"ReadbackWithoutFile", kSim + Args{"readback"}, 2, "-f FILE"},
     BadCase{"ReadbackFileIsASwitch", kSim + Args{"readback", "-f", "-v"}, 2, "'-f' needs a file name"},
+    BadCase{"ReadbackFileGivenTwice", kSim + Args{"readback", "-f", "a.bin", "-f", "b.bin"}, 2, "'-f' is given twice"},
+    BadCase{"LongReadbackSwitchGivenTwice", kSim + Args{"readback", "-file", "a.bin", "-file", "b.bin"}, 2,
+            "'-file' is given twice"},
+    // Numbers are quoted as typed, also those no integer type holds.
+    BadCase{"ClockPastEveryInteger", kSim + Args{"--clock", "99999999999999999999", "erase"}, 2,
+            "--clock 99999999999999999999 is out of range; give 1 to 1000000000 Hz"},
+    BadCase{"ClockWithAUnit", kSim + Args{"--clock", "50MHz", "erase"}, 2, "--clock 50MHz is not a whole number"},
+    BadCase{"IndexPastEveryInteger", kSim + Args{"--index", "-99999999999999999999", "erase"}, 2,
+            "--index -99999999999999999999 is out of range; give 0 to 9999"},
+    BadCase{"DataWidthPastEveryInteger", kSim + Args{"--data-width", "18446744073709551617", "erase"}, 2,
+            "--data-width 18446744073709551617 is out of range; give 1 or 4"},
+    BadCase{"DataWidthOfTwo", kSim + Args{"--data-width", "2", "erase"}, 2, "--data-width 2 is not supported"},
     // The device writes the -f file when -file is given too: the tool must check that one.
     BadCase{"ReadbackOntoTheFlashFile", kSim + Args{"readback", "-file", "out.bin", "-f", "./flash.bin"}, 2,
             "own file"},

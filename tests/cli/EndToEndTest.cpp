@@ -85,7 +85,10 @@ TEST_F(ToolTest, RunsGiveTheirExitStatusAndAFileFlashKeepsItsContents) {
         {kSim + Args{"--sim-fault", "cancel-after=2", "blankcheck"}, 1, "vorant-spi: cancelled by the user"},
         {kSim + Args{"--quiet", "verify", "image.bin"}, 1, "vorant-spi: verify failed"},
         {kSim + Args{"--sim-fault", "cancel-after=3", "readback", "-f", "part.bin"}, 1,
-         "INFO: part.bin holds only the pages read before the cancel."},
+         "INFO: Nothing was written: part.bin is written only when the readback succeeds."},
+        // The rate counts only the phase that moved the data.
+        {kSim + Args{"program", "image.bin", "-e", "-v"}, 0, " simulated (erase 5.000 s, program "},
+        {kSim + Args{"readback", "-f", "whole.bin"}, 0, " simulated (read 340.8 ms at 5.87 MiB/s)"},
         // A recorded verify played on an erased flash: every compared read mismatches.
         {{"--part", "W25Q16JV", "--port", "svf:verify.svf", "verify", "image.bin"}, 0, "recorded to verify.svf"},
         {{"--part", "W25Q16JV", "play", "verify.svf"}, 1, "ERROR: verify.svf: line "},

@@ -55,11 +55,13 @@ struct Result {
     }
 };
 
-// The tool running in `dir`; its output goes to files in `logDir`. A file
-// size limit makes every write past it fail, as on a full disk.
+// The tool running in `dir`; its output goes to files in `logDir`, or its
+// standard output to `stdoutFd` when one is given. A file size limit makes
+// every write past it fail, as on a full disk.
 class Child {
 public:
-    Child(Args args, const fs::path& dir, const fs::path& logDir, rlim_t fileLimit = RLIM_INFINITY)
+    Child(Args args, const fs::path& dir, const fs::path& logDir, rlim_t fileLimit = RLIM_INFINITY,
+          int stdoutFd = -1)
         : out_(logDir / "out"), err_(logDir / "err") {
         const char* bin = std::getenv("VORANT_BIN_DIR");  // set by ctest; else beside this test program
         const fs::path binDir = bin ? fs::path(bin) : fs::read_symlink("/proc/self/exe").parent_path();
@@ -69,12 +71,14 @@ public:
         argv.push_back(nullptr);
         pid_ = fork();
         if (pid_ != 0) return;
-        const int in = open("/dev/null", O_RDONLY), out = creat(out_.c_str(), 0600), err = creat(err_.c_str(), 0600);
+        const int in = open("/dev/null", O_RDONLY), err = creat(err_.c_str(), 0600);
+        const int out = stdoutFd >= 0 ? stdoutFd : creat(out_.c_str(), 0600);
         const rlimit limit{fileLimit, fileLimit};
         if (in < 0 || out < 0 || err < 0 || dup2(in, 0) < 0 || dup2(out, 1) < 0 || dup2(err, 2) < 0 ||
             chdir(dir.c_str()) != 0 || setrlimit(RLIMIT_FSIZE, &limit) != 0)
             _exit(126);
         std::signal(SIGINT, SIG_DFL);
+        std::signal(SIGPIPE, SIG_DFL);  // as a shell starts it: the tool must ignore SIGPIPE itself
         std::signal(SIGXFSZ, SIG_IGN);
         execv(argv[0], argv.data());
         _exit(127);

@@ -1,8 +1,12 @@
 // Readback writers: bit order, record layout, refused targets, atomic
-// replacement, a readback written through the host's factory, and a
-// cross-check of reader and writer against srec_cat (skipped where it is
-// not installed).
+// replacement held back until the host publishes it, a readback written
+// through the host's factory, and a cross-check of reader and writer
+// against srec_cat (skipped where it is not installed). A writer leaves its
+// finished file pending (PendingOutputs); these tests publish it as the
+// tool does after a successful readback.
 #include "tests/formats/FormatsTestFiles.h"
+
+#include "host/PendingOutputs.h"
 
 #include <gtest/gtest.h>
 
@@ -29,6 +33,7 @@ TEST(Writers, CapturedBytesAreWrittenBitReversedIn16Or32ByteRecordsWithAn04Recor
         std::iota(flash.begin(), flash.end(), c.first);
         auto writer = openConfigDataWriter(dir.file(c.name), c.recordBytes);
         ASSERT_TRUE(writer->beginWrite() && writePages(*writer, flash, c.offset, 8) && writer->endWrite());
+        EXPECT_TRUE(PendingOutputs::commitAll().empty());
         EXPECT_EQ(readFile<std::string>(dir.file(c.name)), c.text) << c.name;
     }
     EXPECT_THROW(openConfigDataWriter(dir.file("g.hex"), 24), std::invalid_argument);
@@ -46,7 +51,7 @@ TEST(Writers, UnwritableTargetIsRefusedNamingItAndNothingIsCreated) {
     EXPECT_TRUE(dir.entries() == 1 && fs::is_empty(dir.path / "taken.mcs"));
 }
 
-TEST(Writers, AbandonedWriteLeavesTheTargetAndAReadbackReadsBackAsTheFlash) {
+TEST(Writers, AbandonedOrDiscardedWriteLeavesTheTargetAndAPublishedReadbackReadsBackAsTheFlash) {
     registerStandardFormats();
     Bytes flash = randomBytes(0x10000 + 0x800, 21);     // crosses 64 KiB
     std::fill(flash.end() - 0x300, flash.end(), 0xFF);  // erased tail
@@ -57,8 +62,15 @@ TEST(Writers, AbandonedWriteLeavesTheTargetAndAReadbackReadsBackAsTheFlash) {
         writeFile(path, earlier);
         ASSERT_TRUE(writePages(*openConfigDataWriter(path), flash, 0, 256)) << "abandoned before endWrite";
         EXPECT_TRUE(readFile(path) == earlier && dir.entries() == 1) << name << ": changed, or a temporary file is left";
+        // Ended, then the run it belonged to failed: the host discards it.
+        ASSERT_TRUE(openConfigDataWriter(path)->endWrite()) << name;
+        EXPECT_EQ(PendingOutputs::discardAll(), 1u);
+        EXPECT_TRUE(readFile(path) == earlier && dir.entries() == 1) << name << ": a discarded file showed up";
         std::unique_ptr<ConfigDataWriter> writer(ConfigDataWriter::CreateWriter(path.c_str(), "part", nullptr));
         ASSERT_TRUE(writer && writer->beginWrite() && writePages(*writer, flash, 0, 256) && writer->endWrite()) << name;
+        writer.reset();
+        EXPECT_TRUE(readFile(path) == earlier) << name << ": replaced before the host published it";
+        EXPECT_TRUE(PendingOutputs::commitAll().empty());
         EXPECT_EQ(loadFlashImage(path).bytes(), flash) << name;
         EXPECT_TRUE(!*lineEnd || readFile<std::string>(path).find(lineEnd) == 15) << name << ": line end after the first record";
     }
@@ -83,6 +95,7 @@ TEST(SrecCat, ItsFilesReadAsItConvertsThemAndOursConvertBackToTheData) {
     for (const auto& [name, recordBytes, offset] : {std::tuple{"ours.mcs", 16, 0}, {"ours.hex", 32, 0x1F000}}) {
         auto writer = openConfigDataWriter(dir.file(name), recordBytes);
         ASSERT_TRUE(writePages(*writer, flash, offset, 256) && writer->endWrite());
+        ASSERT_TRUE(PendingOutputs::commitAll().empty());
         ASSERT_TRUE(srecCat("'" + dir.file(name) + "' -intel -offset -" + std::to_string(offset) + " -o " + back + " -binary"));
         EXPECT_EQ(readFile(dir.file("back.bin")), flash) << name;
     }

@@ -1,13 +1,18 @@
 // A readback or recording either replaces its target whole or leaves it
-// exactly as it was.
+// exactly as it was; what a name resolves to decides how it is written.
 #include "host/AtomicOutputFile.h"
+#include "host/OutputTarget.h"
+#include "host/PendingOutputs.h"
 #include "host/VorantException.h"
 
 #include <gtest/gtest.h>
 
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <sys/stat.h>
+#include <unistd.h>
 
 namespace {
 
@@ -21,9 +26,10 @@ std::string contents(const fs::path& file) {
 class AtomicOutput : public ::testing::Test {
 protected:
     void SetUp() override {
-        folder = fs::temp_directory_path() / ("vorant-atomic-" + std::to_string(::testing::UnitTest::GetInstance()->random_seed()));
-        fs::remove_all(folder);
-        fs::create_directories(folder);
+        // A folder of its own: ctest runs these tests side by side.
+        std::string name = (fs::temp_directory_path() / "vorant-atomic-XXXXXX").string();
+        ASSERT_NE(mkdtemp(name.data()), nullptr);
+        folder = name;
         std::ofstream(folder / "old.bin") << "earlier contents";
     }
     void TearDown() override {
@@ -67,6 +73,87 @@ TEST_F(AtomicOutput, UnwritableTargetsAreRefusedCreatingNothing) {
     }
     EXPECT_EQ(contents(folder / "old.bin"), "earlier contents");
     EXPECT_EQ(entries(), 2u);
+}
+
+TEST_F(AtomicOutput, NamesResolveToWhatAWriteWouldReach) {
+    fs::create_directory(folder / "real");
+    std::ofstream(folder / "real" / "file.bin") << "x";
+    fs::create_symlink("real/file.bin", folder / "link");
+    fs::create_symlink("link", folder / "link-to-link");
+    fs::create_symlink("real/later.bin", folder / "dangling");
+    fs::create_symlink("loop-b", folder / "loop-a");
+    fs::create_symlink("loop-a", folder / "loop-b");
+    fs::create_symlink("real", folder / "folder-link");
+    ASSERT_EQ(mkfifo((folder / "fifo").c_str(), 0600), 0);
+    using vorant::OutputDelivery;
+    const struct { fs::path name; OutputDelivery delivery; fs::path path; const char* error; } cases[] = {
+        {folder / "old.bin", OutputDelivery::Replace, folder / "old.bin", ""},
+        {folder / "new.bin", OutputDelivery::Replace, folder / "new.bin", ""},
+        {folder / "link", OutputDelivery::Replace, folder / "real/file.bin", ""},
+        {folder / "link-to-link", OutputDelivery::Replace, folder / "real/file.bin", ""},
+        {folder / "dangling", OutputDelivery::Replace, folder / "real/later.bin", ""},
+        {folder / "fifo", OutputDelivery::Direct, folder / "fifo", ""},
+        {"/dev/null", OutputDelivery::Direct, "/dev/null", ""},
+        {"-", OutputDelivery::StandardOutput, "-", ""},
+        {folder / "loop-a", OutputDelivery::Replace, "", "too many levels of symbolic links"},
+        {folder / "folder-link", OutputDelivery::Replace, "", "is a directory"},
+        {folder / "missing" / "x.bin", OutputDelivery::Replace, "", "does not exist"},
+    };
+    for (const auto& c : cases) {
+        try {
+            const vorant::OutputTarget target = vorant::resolveOutputTarget(c.name);
+            EXPECT_TRUE(*c.error == '\0') << c.name << " was accepted";
+            EXPECT_EQ(target.delivery, c.delivery) << c.name;
+            EXPECT_EQ(target.path, c.path) << c.name;
+        } catch (const VorantException& e) {
+            EXPECT_NE(*c.error, '\0') << c.name << ": " << e.what();
+            EXPECT_NE(std::string(e.what()).find(c.error), std::string::npos) << e.what();
+        }
+    }
+}
+
+TEST_F(AtomicOutput, ThroughALinkTheFileItPointsToIsReplacedAndTheLinkStays) {
+    fs::create_directory(folder / "real");
+    std::ofstream(folder / "real" / "file.bin") << "earlier";
+    fs::create_symlink("real/file.bin", folder / "link");
+    vorant::AtomicOutputFile file(folder / "link");
+    EXPECT_EQ(file.temporaryPath().parent_path(), folder / "real") << "the rename stays in the target's folder";
+    ASSERT_TRUE(file.write("new contents"));
+    std::string error;
+    ASSERT_TRUE(file.commit(error)) << error;
+    EXPECT_TRUE(fs::is_symlink(folder / "link"));
+    EXPECT_EQ(contents(folder / "real" / "file.bin"), "new contents");
+    EXPECT_EQ(std::distance(fs::directory_iterator(folder / "real"), {}), 1);
+}
+
+TEST_F(AtomicOutput, ADeviceIsWrittenInPlaceAndNeverReplaced) {
+    vorant::AtomicOutputFile file("/dev/null");
+    EXPECT_FALSE(file.replacesTarget());
+    EXPECT_TRUE(file.temporaryPath().empty());
+    ASSERT_TRUE(file.write(std::string(100000, 'x')));
+    std::string error;
+    ASSERT_TRUE(file.commit(error)) << error;
+    EXPECT_TRUE(fs::is_character_file("/dev/null"));
+}
+
+// A closed file stays unpublished until the host decides.
+TEST_F(AtomicOutput, PendingFilesAreNeitherSeenBeforeTheCommitNorAfterADiscard) {
+    for (const bool succeeded : {false, true}) {
+        auto file = std::make_unique<vorant::AtomicOutputFile>(folder / "old.bin");
+        ASSERT_TRUE(file->write("new contents"));
+        std::string error;
+        ASSERT_TRUE(file->close(error)) << error;
+        vorant::PendingOutputs::add(std::move(file));
+        EXPECT_EQ(contents(folder / "old.bin"), "earlier contents");
+        if (succeeded) {
+            EXPECT_TRUE(vorant::PendingOutputs::commitAll().empty());
+        } else {
+            EXPECT_EQ(vorant::PendingOutputs::discardAll(), 1u);
+        }
+        EXPECT_EQ(contents(folder / "old.bin"), succeeded ? "new contents" : "earlier contents");
+        EXPECT_EQ(entries(), 1u);
+        EXPECT_EQ(vorant::PendingOutputs::count(), 0u);
+    }
 }
 
 }  // namespace
