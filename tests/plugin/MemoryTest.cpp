@@ -228,6 +228,15 @@ TEST_P(Memory, VerifyAndChecksum) {
         {.name = "checksum, differing", .run = checksum, .result = 0, .status = sums,
          .errors = {"'0': Checksums differ.\n"}, .dataBytes = 20, .flip = 3},
         {"checksum, empty data", checksum, 1, kNoScan, {}, {}, sums, {}, {}, {}, 0},
+        // The capture starts as a copy of the file's page: a page that was
+        // not read ends the run with its address, no "done.", no verdict.
+        {.name = "verify, failed read", .result = 0, .stream = concat({verifyRead(0), withoutLast(verifyRead(1))}),
+         .script = {.failShifts = {4}}, .status = {reading},
+         .errors = {"'0': Verification terminated, the page at address 0x108 could not be read.\n"}, .dataBytes = 20,
+         .base = 0x100},
+        {.name = "checksum, failed read", .run = checksum, .result = 0, .stream = withoutLast(verifyRead(0)),
+         .script = {.failShifts = {1}}, .status = {reading},
+         .errors = {"'0': Checksum terminated, the page at address 0x0 could not be read.\n"}, .dataBytes = 20},
         // A cancelled checksum covers part of the range: no sums.
         {"checksum cancelled", checksum, 0, verifyRead(0), {.cancelFrom = 1}, {},
          {reading, "done.\n", "'0': Checksum cancelled.\n"}, {}, {}, {}, 20},
