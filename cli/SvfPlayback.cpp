@@ -1,5 +1,6 @@
 #include "cli/SvfPlayback.h"
 
+#include "cli/FlashFileAdvice.h"
 #include "cli/RunSummary.h"
 #include "cli/SimFaultOption.h"
 #include "cli/Tool.h"
@@ -53,7 +54,7 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
         // statement, so a malformed file leaves the flash as it was.
         result = player.playFile(svfFile);
     } catch (const VorantException& problem) {
-        throw UsageError(std::string(problem.what()) + "; use a flash file made for this chip, or a new file name");
+        throw UsageError(std::string(problem.what()) + "; " + flashFileAdvice(problem));
     } catch (const svf::SvfError& problem) {
         // Nothing was played: a backing file made for this run goes again.
         if (!backingFile.empty() && !backingFileExisted) std::filesystem::remove(backingFile, error);
