@@ -6,6 +6,7 @@
 #include "cli/PartListing.h"
 #include "cli/ProgressAwareSink.h"
 #include "cli/SvfPlayback.h"
+#include "cli/ToolFailure.h"
 #include "cli/UsageError.h"
 #include "host/MessageSinks.h"
 
@@ -44,7 +45,7 @@ int runOperation(const CommandLine& command, ProgressAwareSink& sink) {
 }
 
 // Runs a step of the tool; a usage error becomes its one line and exit
-// status 2, anything unexpected a line and status 1.
+// status 2, a failure or anything unexpected a line and status 1.
 template <class Step>
 int guarded(Step&& step) {
     try {
@@ -52,6 +53,9 @@ int guarded(Step&& step) {
     } catch (const UsageError& error) {
         printToolError(error.what());
         return kExitUsage;
+    } catch (const ToolFailure& failure) {
+        printToolError(failure.what());
+        return kExitFailure;
     } catch (const std::exception& error) {
         printToolError(std::string("unexpected failure: ") + error.what());
         return kExitFailure;

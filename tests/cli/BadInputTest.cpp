@@ -30,6 +30,7 @@ TEST_P(BadInput, IsRefusedWithOneLineAndChangesNothing) {
     write("bad.hex", ":020000040000FA\n:10000000000102030405060708090A0B0C0D0E0F78\n:10001000GG\n:00000001FF\n");
     write("old.svf", "// an older recording\n");
     write("cut.bin", std::string(kSimBytes / 2, '\xFF'));  // a flash file whose making was cut off
+    write("huge.svf", "SDR 8 TDI (00);\nSDR 268435456 TDI (0);\nSDR 268435456 TDI (0);\n");
     write("lacking.toml", userPart("TEST_LACKING", "EF40B1", {{"PROGRAM_WAITTIME_INC", ""}}));
     write("invalid.toml", userPart("TEST_ODD_PAGE", "EF40B2", {{"PAGE_SIZE", "2047"}, {"TOTAL_SHIFT_SIZE", "2079"}}));
     const auto before = snapshot();
@@ -79,6 +80,11 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
             "flash file 'new.bin' cannot be created: the file size limit is reached after 65536 of its 2097168 bytes; "
             "no file was made; make room on the disk", 64 * 1024},
     BadCase{"SharedIdCreatesNoFlashFile", {"--chip", "N25Q128A", "--port", "sim:new.bin", "erase"}, 2, "N25Q128A"},
+    // A file readable but holding nothing to play is a failure, not a success.
+    BadCase{"PlayingAFileWithoutScans", {"--port", "sim:new.bin", "play", "old.svf"}, 1,
+            "vorant-spi: old.svf: no scan to play (the file holds no SDR or SIR that shifts a bit); nothing was played"},
+    BadCase{"PlayingAScanLongerThan1Mibit", {"--port", "sim:new.bin", "play", "huge.svf"}, 2,
+            "huge.svf: line 2: SDR: length 268435456 is longer than the longest scan accepted (1048576 bits"},
     BadCase{"UnknownOperation", kSim + Args{"frobnicate"}, 2, "unknown operation 'frobnicate'"},
     // Quad Enable writes only where it is register 2 bit 1 written by 01h with two bytes.
     BadCase{"QeSet", kSim + Args{"qe", "set"}, 2, "W25Q16JV" + kNoQe},
