@@ -43,7 +43,8 @@ std::string describeCharacter(char c) {
 
 class IntelHexParser {
 public:
-    explicit IntelHexParser(const std::string& sourceName) : sourceName_(sourceName) {}
+    IntelHexParser(const std::string& sourceName, std::uint64_t maxImageBytes)
+        : sourceName_(sourceName), maxImageBytes_(maxImageBytes) {}
 
     FlashImage parse(std::istream& in) {
         std::string line;
@@ -165,10 +166,9 @@ private:
     void placeRun(std::uint64_t start, const unsigned char* data, std::size_t count) {
         if (count == 0) return;
         const std::uint64_t end = start + count;
-        if (end > kMaxIntelHexImageBytes) {
-            fail(lineNumber_, "data at " + hexNumber(start, 8) + " reach past " +
-                                  hexNumber(kMaxIntelHexImageBytes, 8) +
-                                  ", the end of the largest supported image (256 MiB, more than any flash holds)");
+        if (end > maxImageBytes_) {
+            fail(lineNumber_, "data at " + hexNumber(start, 8) + " reach past " + hexNumber(maxImageBytes_, 8) +
+                                  ", the end of the largest supported image");
         }
         if (covered_.overlaps(start, end)) {
             fail(lineNumber_, "data at " + hexNumber(start, 8) + ".." + hexNumber(end - 1, 8) +
@@ -201,6 +201,7 @@ private:
     };
 
     const std::string sourceName_;
+    const std::uint64_t maxImageBytes_;
     std::size_t lineNumber_ = 0;
     bool sawEndOfFile_ = false;
     bool segmented_ = false;
@@ -214,8 +215,8 @@ private:
 
 }  // namespace
 
-FlashImage parseIntelHex(std::istream& in, const std::string& sourceName) {
-    return IntelHexParser(sourceName).parse(in);
+FlashImage parseIntelHex(std::istream& in, const std::string& sourceName, std::uint64_t maxImageBytes) {
+    return IntelHexParser(sourceName, maxImageBytes).parse(in);
 }
 
 FlashImage readIntelHexImage(const std::string& path) {

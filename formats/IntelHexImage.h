@@ -7,6 +7,11 @@
 
 namespace vorant::formats {
 
+// The highest extent a HEX image may reach: 256 MiB. A part's DEVICE_SIZE
+// counts bits in a signed 32-bit number, so no flash holds more; an image
+// beyond it fits no part, and laying it out would cost memory for nothing.
+inline constexpr std::uint64_t kMaxIntelHexImageBytes = std::uint64_t{1} << 28;
+
 // Intel HEX (.hex, .mcs) into an image laid out from flash address 0.
 //
 // Records taken: 00 data, 01 end of file, 02 extended segment address,
@@ -33,12 +38,9 @@ namespace vorant::formats {
 // before it is refused.
 FlashImage readIntelHexImage(const std::string& path);
 
-// The highest extent a HEX image may reach: 256 MiB. A part's DEVICE_SIZE
-// counts bits in a signed 32-bit number, so no flash holds more; an image
-// beyond it fits no part, and laying it out would cost memory for nothing.
-inline constexpr std::uint64_t kMaxIntelHexImageBytes = std::uint64_t{1} << 28;
-
-// The same from a stream; sourceName stands for the file in messages.
-FlashImage parseIntelHex(std::istream& in, const std::string& sourceName);
+// The same from a stream; sourceName stands for the file in messages, and
+// data past maxImageBytes are refused.
+FlashImage parseIntelHex(std::istream& in, const std::string& sourceName,
+                         std::uint64_t maxImageBytes = kMaxIntelHexImageBytes);
 
 }  // namespace vorant::formats
