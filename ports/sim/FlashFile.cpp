@@ -136,7 +136,11 @@ void FlashFile::createErased() {
     const fs::path target(path_);
     TemporaryFile temporary(temporaryNameBeside(target));
     std::FILE* out = std::fopen(temporary.path().string().c_str(), "wb");
-    if (!out) fail("cannot be created: " + std::string(std::strerror(errno)));
+    if (!out) {
+        const int code = errno;
+        fail(isOutOfSpace(code) ? FlashFileError::Kind::DiskFull : FlashFileError::Kind::Unusable,
+             "cannot be created: " + describeWriteError(code));
+    }
     // Unbuffered: each write reaches the file at once, so a short one is
     // counted exactly and its errno is its own.
     std::setvbuf(out, nullptr, _IONBF, 0);
