@@ -1,7 +1,7 @@
 #include "cli/ChipChecks.h"
 
 #include "cli/ChipProbe.h"
-#include "cli/RunRefused.h"
+#include "cli/ToolFailure.h"
 #include "host/ConstraintsManager.h"
 #include "host/UT_STR.h"
 
@@ -37,10 +37,10 @@ bool allBytesAre(const std::vector<std::uint8_t>& bytes, std::uint8_t value) {
 
 void checkChipAnswers(ChipProbe& probe, ScanPort& port, const std::string& part) {
     const auto id = probe.read(partText(part, "IDENTIFICATION_INSTRUCTION"), kIdBytes);
-    if (!id) throw RunRefused("the chip's ID could not be read" + portReason(port) + "; nothing was written");
+    if (!id) throw ToolFailure("the chip's ID could not be read" + portReason(port) + "; nothing was written");
     // A chip in deep power-down, or none at all, leaves MISO at one level.
     if (allBytesAre(*id, 0xFF) || allBytesAre(*id, 0x00))
-        throw RunRefused("no chip answered the ID read (it read " + hexText(*id) +
+        throw ToolFailure("no chip answered the ID read (it read " + hexText(*id) +
                          "): check the connection, or wake a chip in deep power-down with 'vorant-spi --part " +
                          part + " release'; nothing was written");
 }
@@ -59,12 +59,12 @@ std::string setBlockProtectBits(const std::string& part, std::uint8_t status) {
 void checkNoBlockProtection(ChipProbe& probe, ScanPort& port, const std::string& part) {
     const auto status = probe.readRegister(partText(part, "READSTATUS_INSTRUCTION"));
     if (!status)
-        throw RunRefused("status register 1 could not be read" + portReason(port) + "; nothing was written");
+        throw ToolFailure("status register 1 could not be read" + portReason(port) + "; nothing was written");
     const std::string names = setBlockProtectBits(part, *status);
     if (names.empty()) return;
     char value[8];
     std::snprintf(value, sizeof value, "0x%02X", static_cast<unsigned>(*status));
-    throw RunRefused("the chip is write-protected: " + names + " set in status register 1 (" + value +
+    throw ToolFailure("the chip is write-protected: " + names + " set in status register 1 (" + value +
                      "), so erase and program would change nothing; clear them with 'vorant-spi --part " + part +
                      " unlock'; nothing was written");
 }
@@ -81,12 +81,12 @@ void checkQuadEnableAfterWrite(ScanPort& port, const std::string& part, bool exp
     ChipProbe probe(port);
     const auto status2 = probe.readRegister(partText(part, "READSTATUS2_INSTRUCTION"));
     if (!status2)
-        throw RunRefused("status register 2 could not be read back to check Quad Enable" + portReason(port));
+        throw ToolFailure("status register 2 could not be read back to check Quad Enable" + portReason(port));
     const bool set = ((*status2 >> kQuadEnableBit) & 1u) != 0;
     if (set == expectedSet) return;
     char value[8];
     std::snprintf(value, sizeof value, "0x%02X", static_cast<unsigned>(*status2));
-    throw RunRefused(std::string("Quad Enable was to be ") + (expectedSet ? "set" : "cleared") +
+    throw ToolFailure(std::string("Quad Enable was to be ") + (expectedSet ? "set" : "cleared") +
                      " but status register 2 reads " + value + " (QE " + (set ? "set" : "clear") +
                      ") after the write");
 }

@@ -15,12 +15,12 @@ struct WriteCheck {
     bool noBlockProtection = false;
 };
 
-// Runs the check on `port` for `part`. Throws RunRefused with a line that
+// Runs the check on `port` for `part`. Throws ToolFailure with a line that
 // names the cause and the operation that mends it.
 void checkChipBeforeWrite(ScanPort& port, const std::string& part, const WriteCheck& check);
 
 // Reads status register 2 back after an operation that wrote Quad Enable
-// and throws RunRefused when the bit is not what was asked.
+// and throws ToolFailure when the bit is not what was asked.
 void checkQuadEnableAfterWrite(ScanPort& port, const std::string& part, bool expectedSet);
 
 }  // namespace vorant::cli

@@ -10,7 +10,7 @@
 #include "cli/ProgressAwareSink.h"
 #include "cli/ProgressDisplay.h"
 #include "cli/ProgressPort.h"
-#include "cli/RunRefused.h"
+#include "cli/ToolFailure.h"
 #include "cli/RunSummary.h"
 #include "cli/SameFile.h"
 #include "cli/SvfPlayback.h"
@@ -195,7 +195,7 @@ std::string expectedSignature(const std::string& part) {
 
 void checkSignatureKnown(const std::string& part, const OperationInfo& info) {
     if (info.operation == Operation::Signature && expectedSignature(part).empty())
-        throw RunRefused(part + " has no electronic signature to read (no RES_SIGNATURE or no "
+        throw ToolFailure(part + " has no electronic signature to read (no RES_SIGNATURE or no "
                                 "READSIGNATURE_INSTRUCTION in its part entry); read its JEDEC ID with 'idcode'");
 }
 
@@ -391,7 +391,7 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         try {
             if (const std::optional<bool> qe = quadEnableWritten(request, device, run.part))
                 checkQuadEnableAfterWrite(run.session->port(), run.part, *qe);
-        } catch (const RunRefused& problem) {
+        } catch (const ToolFailure& problem) {
             toolError(problem.what());
             result = false;
         }

@@ -1,6 +1,6 @@
 #include "cli/PartIdentification.h"
 
-#include "cli/RunRefused.h"
+#include "cli/ToolFailure.h"
 #include "cli/UsageError.h"
 #include "host/ConstraintsManager.h"
 #include "host/VorantException.h"
@@ -65,7 +65,7 @@ Identification identifyPart(ScanPort& port, int index) {
     const char* id = reader->getAttribute(DeviceNS::ATTR_IDCODE);
     if (!read || id == nullptr || *id == '\0') {
         const char* reason = port.failureReason();
-        throw RunRefused(std::string("the JEDEC ID could not be read over the port") +
+        throw ToolFailure(std::string("the JEDEC ID could not be read over the port") +
                          (reason != nullptr ? std::string(": ") + reason : std::string()));
     }
 
@@ -75,7 +75,7 @@ Identification identifyPart(ScanPort& port, int index) {
     if (const std::string problem = identificationProblem(identification.jedecId, matches); !problem.empty()) {
         // A chip that does not answer is a failed run; an answer the
         // database cannot place asks the user to name the part.
-        if (!chipAnswered(identification.jedecId)) throw RunRefused(problem);
+        if (!chipAnswered(identification.jedecId)) throw ToolFailure(problem);
         throw UsageError(problem);
     }
     identification.partName = matches.front();

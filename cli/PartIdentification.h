@@ -14,7 +14,7 @@ struct Identification {
 // --part auto: reads the JEDEC ID over the port with a device built for a
 // part that reads it with 9Fh (every shipped part does, so any of them can
 // ask whatever chip answers) and returns the one part that has that ID.
-// Throws RunRefused when no chip answers (or the read fails), UsageError,
+// Throws ToolFailure when no chip answers (or the read fails), UsageError,
 // listing what matched, when no part has the ID or several do.
 Identification identifyPart(ScanPort& port, int index);
 

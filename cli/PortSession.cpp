@@ -1,5 +1,6 @@
 #include "cli/PortSession.h"
 
+#include "cli/FlashFileAdvice.h"
 #include "cli/SimFaultOption.h"
 #include "cli/UsageError.h"
 #include "host/VorantException.h"
@@ -28,8 +29,7 @@ std::unique_ptr<PortSession> PortSession::openSimulator(const ToolOptions& optio
         session->simulator_ =
             std::make_unique<sim::SimScanPort>(config, simFaultPlan(options.simFaults), file);
     } catch (const VorantException& problem) {
-        throw UsageError(std::string(problem.what()) +
-                         "; use a flash file made for this chip, or a new file name");
+        throw UsageError(std::string(problem.what()) + "; " + flashFileAdvice(problem));
     }
     if (!file.empty() && !fileExisted) session->createdBackingFile_ = file;
     if (options.clockHz) session->simulator_->setClockHz(*options.clockHz);

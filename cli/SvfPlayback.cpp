@@ -1,21 +1,35 @@
 #include "cli/SvfPlayback.h"
 
+#include "cli/FlashFileAdvice.h"
 #include "cli/RunSummary.h"
 #include "cli/SimFaultOption.h"
 #include "cli/Tool.h"
+#include "cli/ToolFailure.h"
 #include "cli/ToolMessages.h"
 #include "cli/UsageError.h"
 #include "host/ConstraintsManager.h"
 #include "host/VorantException.h"
 #include "ports/sim/FlashModel.h"
 #include "ports/svf/SvfError.h"
+#include "ports/svf/SvfFileCheck.h"
+#include "ports/svf/SvfParser.h"
 #include "ports/svf/SvfPlayer.h"
 
 #include <chrono>
+#include <cstdint>
 #include <filesystem>
+#include <fstream>
 #include <system_error>
 
 namespace vorant::cli {
+namespace {
+
+// "1 scan", "2 scans": the plural for every count but one.
+std::string counted(std::uint64_t count, const char* one, const char* many) {
+    return std::to_string(count) + " " + (count == 1 ? one : many);
+}
+
+}  // namespace
 
 std::string simulatedChipName(const ToolOptions& options) {
     if (options.chip) return *options.chip;
@@ -40,6 +54,20 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
     } catch (const VorantException& problem) {
         throw UsageError(std::string(problem.what()) + "; choose another chip with --chip NAME");
     }
+    // The whole file is checked before the flash exists, so a malformed
+    // file, or one that holds nothing to play, leaves no trace.
+    svf::SvfContents contents;
+    try {
+        contents = svf::checkSvfFile(svfFile);
+    } catch (const svf::SvfParseError& problem) {
+        throw UsageError(svfFile + ": " + problem.what() + "; the file is not valid SVF and nothing was played");
+    } catch (const svf::SvfError& problem) {
+        throw UsageError(std::string(problem.what()) + "; give a readable SVF file");
+    }
+    if (contents.scans == 0)
+        throw ToolFailure(svfFile + ": no scan to play (the file holds no SDR or SIR that shifts a bit); "
+                                    "nothing was played");
+
     svf::SvfPlayerOptions playerOptions;
     if (options.clockHz) playerOptions.spiClockHz = *options.clockHz;
     const std::string& backingFile = options.port.file;
@@ -49,11 +77,12 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
     try {
         sim::FlashModel flash(config, simFaultPlan(options.simFaults), backingFile);
         svf::SvfPlayer player(flash, playerOptions);
-        // The player checks the whole file before it plays the first
-        // statement, so a malformed file leaves the flash as it was.
-        result = player.playFile(svfFile);
+        std::ifstream in(svfFile, std::ios::binary);
+        if (!in) throw svf::SvfError("cannot read '" + svfFile + "'");
+        svf::SvfParser parser(in);
+        result = player.play(parser);
     } catch (const VorantException& problem) {
-        throw UsageError(std::string(problem.what()) + "; use a flash file made for this chip, or a new file name");
+        throw UsageError(std::string(problem.what()) + "; " + flashFileAdvice(problem));
     } catch (const svf::SvfError& problem) {
         // Nothing was played: a backing file made for this run goes again.
         if (!backingFile.empty() && !backingFileExisted) std::filesystem::remove(backingFile, error);
@@ -63,14 +92,14 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
     }
 
     constexpr std::size_t kMismatchesShown = 20;
-    for (std::size_t i = 0; i < result.mismatches.size() && i < kMismatchesShown; ++i)
+    const std::size_t mismatches = result.mismatches.size();
+    for (std::size_t i = 0; i < mismatches && i < kMismatchesShown; ++i)
         toolError(svfFile + ": " + result.mismatches[i].describe());
-    if (result.mismatches.size() > kMismatchesShown)
-        toolError("... and " + std::to_string(result.mismatches.size() - kMismatchesShown) + " more mismatches");
-    const std::string verdict =
-        result.passed() ? "no mismatches" : std::to_string(result.mismatches.size()) + " mismatches";
-    toolInfo("Played " + svfFile + " on a simulated " + chip + ": " + std::to_string(result.sdrCount) + " scans, " +
-             std::to_string(result.comparedSdrs) + " compared, " + verdict + ".");
+    if (mismatches > kMismatchesShown)
+        toolError("... and " + counted(mismatches - kMismatchesShown, "more mismatch", "more mismatches"));
+    const std::string verdict = result.passed() ? "no mismatches" : counted(mismatches, "mismatch", "mismatches");
+    toolInfo("Played " + svfFile + " on a simulated " + chip + ": " + counted(result.sdrCount, "scan", "scans") +
+             ", " + std::to_string(result.comparedSdrs) + " compared, " + verdict + ".");
 
     RunFigures figures;
     figures.operation = "play";

@@ -5,8 +5,8 @@
 #include "cli/PartDatabaseSetup.h"
 #include "cli/PartListing.h"
 #include "cli/ProgressAwareSink.h"
-#include "cli/RunRefused.h"
 #include "cli/SvfPlayback.h"
+#include "cli/ToolFailure.h"
 #include "cli/UsageError.h"
 #include "host/MessageSinks.h"
 #include "host/OutputTarget.h"
@@ -47,7 +47,7 @@ int runOperation(const CommandLine& command, ProgressAwareSink& sink) {
 }
 
 // Runs a step of the tool; a usage error becomes its one line and exit
-// status 2, a refused run or anything unexpected a line and status 1.
+// status 2, a failure or anything unexpected a line and status 1.
 template <class Step>
 int guarded(Step&& step) {
     try {
@@ -55,8 +55,8 @@ int guarded(Step&& step) {
     } catch (const UsageError& error) {
         printToolError(error.what());
         return kExitUsage;
-    } catch (const RunRefused& error) {
-        printToolError(error.what());
+    } catch (const ToolFailure& failure) {
+        printToolError(failure.what());
         return kExitFailure;
     } catch (const std::exception& error) {
         printToolError(std::string("unexpected failure: ") + error.what());

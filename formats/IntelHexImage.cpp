@@ -4,6 +4,7 @@
 #include "formats/FormatError.h"
 #include "formats/InputFile.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
@@ -42,7 +43,8 @@ std::string describeCharacter(char c) {
 
 class IntelHexParser {
 public:
-    explicit IntelHexParser(const std::string& sourceName) : sourceName_(sourceName) {}
+    IntelHexParser(const std::string& sourceName, std::uint64_t maxImageBytes)
+        : sourceName_(sourceName), maxImageBytes_(maxImageBytes) {}
 
     FlashImage parse(std::istream& in) {
         std::string line;
@@ -54,7 +56,7 @@ public:
         if (!sawEndOfFile_) {
             fail(lineNumber_, "the file ends without an end-of-file record (type 01)");
         }
-        return FlashImage(std::move(image_));
+        return FlashImage(layOut());
     }
 
 private:
@@ -158,36 +160,63 @@ private:
         }
     }
 
+    // Keeps a run of data bytes; the image is laid out only once the whole
+    // file is accepted, so memory follows the file's size, not its highest
+    // address, until then.
     void placeRun(std::uint64_t start, const unsigned char* data, std::size_t count) {
         if (count == 0) return;
         const std::uint64_t end = start + count;
-        if (end > FlashImage::kMaxBytes) {
-            fail(lineNumber_, "data at " + hexNumber(start, 8) + " reach past " +
-                                  hexNumber(FlashImage::kMaxBytes, 8) + ", the end of the largest supported image");
+        if (end > maxImageBytes_) {
+            fail(lineNumber_, "data at " + hexNumber(start, 8) + " reach past " + hexNumber(maxImageBytes_, 8) +
+                                  ", the end of the largest supported image");
         }
         if (covered_.overlaps(start, end)) {
             fail(lineNumber_, "data at " + hexNumber(start, 8) + ".." + hexNumber(end - 1, 8) +
                                   " overlap data of an earlier record");
         }
         covered_.add(start, end);
-        if (image_.size() < end) image_.resize(static_cast<std::size_t>(end), 0xFF);
-        std::memcpy(image_.data() + start, data, count);
+        if (!runs_.empty() && runs_.back().address + runs_.back().count == start) {
+            runs_.back().count += count;  // records in ascending order stay one run
+        } else {
+            runs_.push_back(Run{start, data_.size(), count});
+        }
+        data_.insert(data_.end(), data, data + count);
+        extent_ = std::max(extent_, end);
     }
 
+    // The image from address 0 to the last data byte; the rest reads 0xFF.
+    std::vector<unsigned char> layOut() {
+        std::vector<unsigned char> image(static_cast<std::size_t>(extent_), 0xFF);
+        for (const Run& run : runs_) std::memcpy(image.data() + run.address, data_.data() + run.offset, run.count);
+        data_ = {};
+        runs_ = {};
+        return image;
+    }
+
+    // Data bytes bound for [address, address + count), kept at `offset` of data_.
+    struct Run {
+        std::uint64_t address;
+        std::size_t offset;
+        std::size_t count;
+    };
+
     const std::string sourceName_;
+    const std::uint64_t maxImageBytes_;
     std::size_t lineNumber_ = 0;
     bool sawEndOfFile_ = false;
     bool segmented_ = false;
     std::uint64_t base_ = 0;
     std::vector<unsigned char> record_;
-    std::vector<unsigned char> image_;
+    std::vector<unsigned char> data_;  // every data byte, in file order
+    std::vector<Run> runs_;
+    std::uint64_t extent_ = 0;  // one past the highest data address
     AddressRanges covered_;
 };
 
 }  // namespace
 
-FlashImage parseIntelHex(std::istream& in, const std::string& sourceName) {
-    return IntelHexParser(sourceName).parse(in);
+FlashImage parseIntelHex(std::istream& in, const std::string& sourceName, std::uint64_t maxImageBytes) {
+    return IntelHexParser(sourceName, maxImageBytes).parse(in);
 }
 
 FlashImage readIntelHexImage(const std::string& path) {

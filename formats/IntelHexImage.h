@@ -1,10 +1,16 @@
 #pragma once
 #include "formats/FlashImage.h"
 
+#include <cstdint>
 #include <istream>
 #include <string>
 
 namespace vorant::formats {
+
+// The highest extent a HEX image may reach: 256 MiB. A part's DEVICE_SIZE
+// counts bits in a signed 32-bit number, so no flash holds more; an image
+// beyond it fits no part, and laying it out would cost memory for nothing.
+inline constexpr std::uint64_t kMaxIntelHexImageBytes = std::uint64_t{1} << 28;
 
 // Intel HEX (.hex, .mcs) into an image laid out from flash address 0.
 //
@@ -24,11 +30,17 @@ namespace vorant::formats {
 //   - an unknown record type, or an 01/02/04 record of the wrong length
 //   - a record after the end-of-file record
 //   - data overlapping data of an earlier record
-//   - data reaching past FlashImage::kMaxBytes
+//   - data reaching past kMaxIntelHexImageBytes
 //   - a file that ends without an end-of-file record (names its last line)
+//
+// The records are collected first and the image is laid out once the whole
+// file is accepted, so a small file naming a far address costs no memory
+// before it is refused.
 FlashImage readIntelHexImage(const std::string& path);
 
-// The same from a stream; sourceName stands for the file in messages.
-FlashImage parseIntelHex(std::istream& in, const std::string& sourceName);
+// The same from a stream; sourceName stands for the file in messages, and
+// data past maxImageBytes are refused.
+FlashImage parseIntelHex(std::istream& in, const std::string& sourceName,
+                         std::uint64_t maxImageBytes = kMaxIntelHexImageBytes);
 
 }  // namespace vorant::formats

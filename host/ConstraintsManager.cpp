@@ -1,5 +1,6 @@
 #include "ConstraintsManager.h"
 
+#include "PartFileReader.h"
 #include "PropertyText.h"
 #include "UT_STR.h"
 #include "VorantException.h"
@@ -10,70 +11,9 @@
 #include <set>
 #include <sstream>
 
-#define TOML_EXCEPTIONS 1
-#include <toml++/toml.h>
-
 namespace {
 
-using Properties = std::map<std::string, std::string>;
-
-struct ParsedFile {
-    std::map<std::string, Properties> families;
-    std::map<std::string, Properties> parts;
-};
-
-std::string where(const toml::source_region& region) {
-    return std::to_string(region.begin.line) + ":" + std::to_string(region.begin.column);
-}
-
-// A TOML value as the text the database stores.
-std::string valueText(const toml::node& node, const std::string& context) {
-    if (auto s = node.as_string()) return s->get();
-    if (auto b = node.as_boolean()) return b->get() ? "TRUE" : "FALSE";
-    if (auto i = node.as_integer()) {
-        const std::int64_t v = i->get();
-        if (v < INT32_MIN || v > INT32_MAX)
-            throw VorantException(context + ": " + std::to_string(v) + " is outside the 32-bit range");
-        return std::to_string(v);
-    }
-    throw VorantException(context + ": expected a text, a whole number or true/false");
-}
-
-Properties readTable(const toml::table& table, const std::string& context) {
-    Properties result;
-    for (const auto& [key, node] : table) {
-        const std::string name(key.str());
-        result[name] = valueText(node, context + ": " + name);
-    }
-    return result;
-}
-
-ParsedFile parseFile(const std::string& text, const std::string& sourceName) {
-    toml::table root;
-    try {
-        root = toml::parse(text, sourceName);
-    } catch (const toml::parse_error& error) {
-        throw VorantException(sourceName + ":" + where(error.source()) + ": " + std::string(error.description()));
-    }
-    ParsedFile parsed;
-    for (const auto& [key, node] : root) {
-        const std::string section(key.str());
-        if (section != "family" && section != "part")
-            throw VorantException(sourceName + ": unknown table '" + section +
-                                  "' (a part file holds [family.NAME] and [part.NAME] tables)");
-        const toml::table* entries = node.as_table();
-        if (!entries) throw VorantException(sourceName + ": '" + section + "' must be a table");
-        auto& target = section == "family" ? parsed.families : parsed.parts;
-        for (const auto& [name, body] : *entries) {
-            const std::string entryName(name.str());
-            const toml::table* table = body.as_table();
-            const std::string context = sourceName + ": " + section + " " + entryName;
-            if (!table) throw VorantException(context + ": must be a table of keys");
-            target[entryName] = readTable(*table, context);
-        }
-    }
-    return parsed;
-}
+using Properties = vorant::host::PartProperties;
 
 }  // namespace
 
@@ -130,7 +70,7 @@ void ConstraintsManager::loadDirectory(const std::string& path) {
 }
 
 void ConstraintsManager::loadText(const std::string& text, const std::string& sourceName) {
-    ParsedFile parsed = parseFile(text, sourceName);
+    vorant::host::PartFileTables parsed = vorant::host::readPartFileText(text, sourceName);
 
     std::lock_guard<std::mutex> lock(mutex_);
     // Families of this file see each other and every family loaded before.

@@ -26,8 +26,10 @@ public:
     bool empty() const { return text_.empty(); }
     const std::basic_string<Char>& str() const { return text_; }
 
-    // Replaces the contents with the text printf would make.
-    StringBase& doFormat(const Char* format, ...) VORANT_PRINTF(2, 3) {
+    // Replaces the contents with the text printf would make. Formatting is
+    // for char texts only, so the format is a plain char text: a type that
+    // does not hang on Char lets every compiler check it as a printf format.
+    StringBase& doFormat(const char* format, ...) VORANT_PRINTF(2, 3) {
         static_assert(sizeof(Char) == 1, "formatting is provided for char texts");
         std::va_list args;
         va_start(args, format);

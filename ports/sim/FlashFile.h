@@ -8,10 +8,14 @@
 // "VSIMFLSH", status register 1 (WIP and WEL cleared), status register 2,
 // six zero bytes.
 //
-// Changes are written through as they happen (one page per program, one
-// sector or the whole array per erase, two bytes per status write), and
-// flushed, so a run that is killed leaves every completed operation in the
-// file.
+// A new file is written whole under a temporary name beside it and then
+// renamed, so a run that is killed or meets a full disk while making it
+// leaves no file cut short. Changes are written through as they happen (one
+// page per program, one sector or the whole array per erase, two bytes per
+// status write), and flushed, so a run that is killed leaves every
+// completed operation in the file.
+
+#include "ports/sim/FlashFileError.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -27,9 +31,10 @@ public:
 
     // Opens the file of a sizeBytes flash. A missing or empty file is
     // created erased (all 0xFF, both status registers 0). Throws
-    // VorantException naming the file when it cannot be opened, read or
-    // created, has the wrong size or lacks the trailer; the file is then
-    // left as it was.
+    // FlashFileError naming the file when it cannot be opened, read or
+    // created (a full disk named as such), belongs to a chip of another
+    // size, is cut short, or lacks the trailer; the file is then left as
+    // it was.
     FlashFile(const std::string& path, std::size_t sizeBytes);
 
     const std::string& path() const { return path_; }
@@ -42,6 +47,8 @@ public:
 
 private:
     [[noreturn]] void fail(const std::string& what) const;
+    [[noreturn]] void fail(FlashFileError::Kind kind, const std::string& what) const;
+    [[noreturn]] void refuseSize(std::uintmax_t existingSize) const;
     void createErased();
 
     std::string path_;

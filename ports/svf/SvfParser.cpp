@@ -142,8 +142,8 @@ void SvfParser::parseScan(SvfStatement& statement, std::string_view name) {
     if (!isNumberLike(lengthToken.text)) fail(lengthToken, context + ": missing length before '" + lengthToken.text + "'");
     if (!parseLength(lengthToken.text, length)) fail(lengthToken, context + ": bad length '" + lengthToken.text + "'");
     if (length > kMaxScanBits)
-        fail(lengthToken, context + ": length " + lengthToken.text + " is longer than the longest supported scan (" +
-                              std::to_string(kMaxScanBits) + " bits)");
+        fail(lengthToken, context + ": length " + lengthToken.text + " is longer than the longest scan accepted (" +
+                              std::to_string(kMaxScanBits) + " bits, far more than a flash transaction needs)");
     const auto bits = static_cast<std::size_t>(length);
 
     SvfScan& scan = statement.scan;

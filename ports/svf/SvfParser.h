@@ -27,9 +27,12 @@ public:
     // The next statement, false at the end of the input.
     bool next(SvfStatement& statement);
 
-    // The longest scan accepted: 256 Mibit, a whole 32 MiB flash in one scan.
-    // Longer lengths are refused instead of exhausting memory.
-    static constexpr std::size_t kMaxScanBits = std::size_t{1} << 28;
+    // The longest scan accepted: 1 Mibit. A flash transaction is one page
+    // and its command (a few thousand bits, bridge headers included), so
+    // this is far more than any needs, yet it keeps the buffers of a scan
+    // small: a tiny file of huge lengths must not take gigabytes. Longer
+    // lengths are refused, with their line, before anything is allocated.
+    static constexpr std::size_t kMaxScanBits = std::size_t{1} << 20;
 
 private:
     struct StickyScan {

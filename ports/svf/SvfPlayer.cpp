@@ -3,6 +3,7 @@
 #include "ports/sim/WireByteOrder.h"
 
 #include "ports/svf/SvfError.h"
+#include "ports/svf/SvfFileCheck.h"
 
 #include <algorithm>
 #include <array>
@@ -17,14 +18,6 @@ namespace {
 std::string hexByte(std::uint8_t value) {
     const char* digits = "0123456789ABCDEF";
     return std::string("0x") + digits[value >> 4] + digits[value & 0xF];
-}
-
-// Reads a stream to its end, only to find malformed statements.
-void checkAll(std::istream& in) {
-    SvfParser parser(in);
-    SvfStatement statement;
-    while (parser.next(statement)) {
-    }
 }
 
 }  // namespace
@@ -46,28 +39,16 @@ void SvfPlayer::reset() {
 }
 
 SvfPlayResult SvfPlayer::playFile(const std::filesystem::path& file) {
-    auto open = [&] {
-        std::ifstream in(file, std::ios::binary);
-        if (!in) throw SvfError("cannot read '" + file.string() + "'");
-        return in;
-    };
-    {
-        std::ifstream in = open();
-        try {
-            checkAll(in);
-        } catch (const SvfParseError& error) {
-            throw SvfParseError(error.line(), error.reason() + " (in '" + file.string() + "')");
-        }
-        if (in.bad()) throw SvfError("cannot read '" + file.string() + "'");
-    }
-    std::ifstream in = open();
+    checkSvfFile(file);
+    std::ifstream in(file, std::ios::binary);
+    if (!in) throw SvfError("cannot read '" + file.string() + "'");
     SvfParser parser(in);
     return play(parser);
 }
 
 SvfPlayResult SvfPlayer::playText(std::string_view text) {
     std::istringstream check{std::string(text)};
-    checkAll(check);
+    checkSvf(check);
     std::istringstream in{std::string(text)};
     SvfParser parser(in);
     return play(parser);

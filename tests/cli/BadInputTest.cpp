@@ -6,7 +6,8 @@
 namespace vorant::cli::test {
 namespace {
 
-struct BadCase { const char* name; Args args; int status; std::string message; };
+// fileLimit: files of the run may not grow past it, as on a full disk.
+struct BadCase { const char* name; Args args; int status; std::string message; rlim_t fileLimit = RLIM_INFINITY; };
 
 class BadInput : public ToolTest, public ::testing::WithParamInterface<BadCase> {
 protected:
@@ -28,11 +29,13 @@ TEST_P(BadInput, IsRefusedWithOneLineAndChangesNothing) {
     fs::permissions(dir / "locked.bin", fs::perms::none);
     write("bad.hex", ":020000040000FA\n:10000000000102030405060708090A0B0C0D0E0F78\n:10001000GG\n:00000001FF\n");
     write("old.svf", "// an older recording\n");
+    write("cut.bin", std::string(kSimBytes / 2, '\xFF'));  // a flash file whose making was cut off
+    write("huge.svf", "SDR 8 TDI (00);\nSDR 268435456 TDI (0);\nSDR 268435456 TDI (0);\n");
     write("lacking.toml", userPart("TEST_LACKING", "EF40B1", {{"PROGRAM_WAITTIME_INC", ""}}));
     write("invalid.toml", userPart("TEST_ODD_PAGE", "EF40B2", {{"PAGE_SIZE", "2047"}, {"TOTAL_SHIFT_SIZE", "2079"}}));
     const auto before = snapshot();
 
-    const Result result = run(GetParam().args);
+    const Result result = run(GetParam().args, GetParam().fileLimit);
     EXPECT_EQ(result.status, GetParam().status) << result.text();
     ASSERT_EQ(result.errLines().size(), 1u) << result.text();
     EXPECT_EQ(result.errLines()[0].rfind("vorant-spi: ", 0), 0u) << result.text();
@@ -82,7 +85,18 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"ReadbackOntoTheFlashFile", kSim + Args{"readback", "-file", "out.bin", "-f", "./flash.bin"}, 2,
             "own file"},
     BadCase{"FlashFileOfAnotherChip", {"--part", "W25Q32JV", "--port", "sim:flash.bin", "erase"}, 2, "flash.bin"},
+    BadCase{"TruncatedFlashFile", {"--part", "W25Q16JV", "--port", "sim:cut.bin", "erase"}, 2,
+            "flash file 'cut.bin' is truncated: it holds 1048576 bytes and no status trailer at its end, where a flash "
+            "file of this chip holds 2097168 (2097152 bytes of flash and a 16-byte status trailer); remove it"},
+    BadCase{"FlashFileOnAFullDisk", {"--part", "W25Q16JV", "--port", "sim:new.bin", "erase"}, 2,
+            "flash file 'new.bin' cannot be created: the file size limit is reached after 65536 of its 2097168 bytes; "
+            "no file was made; make room on the disk", 64 * 1024},
     BadCase{"SharedIdCreatesNoFlashFile", {"--chip", "N25Q128A", "--port", "sim:new.bin", "erase"}, 2, "N25Q128A"},
+    // A file readable but holding nothing to play is a failure, not a success.
+    BadCase{"PlayingAFileWithoutScans", {"--port", "sim:new.bin", "play", "old.svf"}, 1,
+            "vorant-spi: old.svf: no scan to play (the file holds no SDR or SIR that shifts a bit); nothing was played"},
+    BadCase{"PlayingAScanLongerThan1Mibit", {"--port", "sim:new.bin", "play", "huge.svf"}, 2,
+            "huge.svf: line 2: SDR: length 268435456 is longer than the longest scan accepted (1048576 bits"},
     BadCase{"UnknownOperation", kSim + Args{"frobnicate"}, 2, "unknown operation 'frobnicate'"},
     // Quad Enable writes only where it is register 2 bit 1 written by 01h with two bytes.
     BadCase{"QeSet", kSim + Args{"qe", "set"}, 2, "W25Q16JV" + kNoQe},

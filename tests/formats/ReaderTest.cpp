@@ -26,6 +26,11 @@ TEST(IntelHexReader, MalformedFileIsRefusedNamingFileAndLine) {
         // Segment 0x1000 (02) and upper address 0x0001 (04) both reach 0x10000.
         {":020000021000EC\n:0100000011EE\n:020000040001F9\n:0100000022DD\n:00000001FF\n", 4, "overlap"},
         {":020000042000DA\n:0100000011EE\n:00000001FF\n", 2, "the end of the largest supported image"},
+        // Far addresses are refused before any image is laid out: 16 bytes at
+        // 0x1FFFFF00 once took a 512 MiB image. No part holds past 256 MiB.
+        {":020000041FFFDC\n:10FF0000000102030405060708090A0B0C0D0E0F79\n:00000001FF\n", 2,
+         "data at 0x1FFFFF00 reach past 0x10000000, the end of the largest supported image"},
+        {":020000040FFFEC\n:02FFFF000102FD\n:00000001FF\n", 2, "data at 0x0FFFFFFF reach past 0x10000000"},
     };
     ScratchDirectory dir;
     const std::string path = dir.file("image.hex");

@@ -122,6 +122,31 @@ const BadPart kBadParts[] = {
 };
 INSTANTIATE_TEST_SUITE_P(Validation, InvalidParts, ::testing::ValuesIn(kBadParts));
 
+// Text the TOML reader trips over, or that is not ASCII: each is one clear
+// error naming the file (and the first byte past ASCII with its place), never
+// an abort, and nothing of the file is added. The first three once stopped
+// toml++ 3.3.0 on an assertion or an unreachable branch.
+TEST_F(PartLoading, MalformedTextIsRefusedNamingTheFile) {
+    const std::pair<std::string, const char*> cases[] = {
+        {"[}", "vendor.toml: malformed TOML"},
+        {"a = [}", "vendor.toml: malformed TOML"},
+        {"\xCF\xAD", "vendor.toml:1:1: byte 0xCF at offset 0 is not ASCII"},
+        {"[part.TESTPART]\n# caf\xC3\xA9\nPAGE_SIZE = 2048\n", "vendor.toml:2:6: byte 0xC3 at offset 21 is not ASCII"},
+        {"[part.TESTPART]\nDEVICE_SIZE = \x80\n", "vendor.toml:2:15: byte 0x80 at offset 30"},
+        {"[part.TESTPART\n", "vendor.toml:1:"},
+        {"[part.TESTPART]\nPAGE_SIZE = [[[[\n", "vendor.toml:2:"},
+    };
+    for (const auto& [text, expected] : cases) {
+        try {
+            db.loadText(text, "vendor.toml");
+            ADD_FAILURE() << "accepted: " << text;
+        } catch (const VorantException& e) {
+            EXPECT_NE(std::string(e.what()).find(expected), std::string::npos) << e.what();
+        }
+        EXPECT_TRUE(db.partNames().empty()) << text;
+    }
+}
+
 TEST_F(PartLoading, AMissingKeyIsNamed) {
     auto props = vorant::test::w25q128Properties();
     props.erase("WRSR_MAXWAITTIME");

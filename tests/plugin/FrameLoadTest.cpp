@@ -5,6 +5,7 @@
 #include "host/Device.h"
 #include "host/Port_MsgManData.h"
 #include "host/VorantException.h"
+#include "s/Type1SPIDevice.h"
 #include "tests/support/TestParts.h"
 
 #include <gtest/gtest.h>
@@ -25,12 +26,13 @@ TEST(FrameLoad, HostLoadsThePluginAndCreatesAndDestroysADeviceThroughTheFactoryA
     const std::string program = path;
     void* handle = dlopen((program.substr(0, program.rfind('/')) + "/libVorantType1SPIDevice.so").c_str(), RTLD_NOW);
     ASSERT_NE(handle, nullptr) << dlerror();
-    using Factory = DeviceOperation* (*)(const char*);
+    // The factory's own type: calling it through another would be undefined.
+    using Factory = decltype(&create_type1_spi_device);
     auto factory = reinterpret_cast<Factory>(dlsym(handle, "create_type1_spi_device"));
     ASSERT_NE(factory, nullptr) << dlerror();
 
     addTestPart("FRAME_LOADED", w25q128Properties());
-    DeviceOperation* device = factory("FRAME_LOADED");
+    DeviceOperation* device = factory("FRAME_LOADED");  // the host drives it through the table alone
     ASSERT_NE(device, nullptr);
     EXPECT_FALSE(device->spienable(0, nullptr));  // without a port its scans fail instead of crashing
     delete device;                                 // through the base: the destructor is virtual

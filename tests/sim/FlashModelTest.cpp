@@ -2,6 +2,8 @@
 // contents between runs; its configuration from the part database.
 
 #include "ports/sim/FlashFile.h"
+#include "ports/sim/FlashFileError.h"
+#include "tests/sim/FileTestSupport.h"
 #include "tests/sim/SimTestSupport.h"
 #include "tests/support/TestParts.h"
 
@@ -141,23 +143,76 @@ TEST(FlashModel, BitByteAndRunClockingAgree) {
 }
 
 // Two instances on one file: the second finds the first's programs, erases
-// and status bits. A file that cannot be this flash's is refused untouched.
-TEST(FlashFile, KeepsTheFlashBetweenRunsAndRefusesAForeignFile) {
-    const std::string path = ::testing::TempDir() + "vorant-sim-" + std::to_string(std::random_device{}()) + ".bin";
-    std::filesystem::remove(path);
+// and status bits.
+TEST(FlashFile, KeepsTheFlashBetweenRuns) {
+    ScratchFolder folder;
+    const std::string path = folder.file("flash.bin");
     {
         FlashModel chip(smallPart(), FaultPlan{}, path);
         EXPECT_EQ(play(chip, "06|02 001200 1234|+700|06|02 002000 00|+700|06|20 002000|+45000|06|01 1C02|+10000"), "");
     }
     FlashModel again(smallPart(), FaultPlan{}, path);
     EXPECT_EQ(play(again, "03 0011FF>FF1234FF|03 002000>FF|05>1C|35>02"), "");
-    for (std::size_t size : {std::size_t{64 * 1024}, 128 * 1024 + FlashFile::kTrailerBytes}) {
-        std::ofstream(path, std::ios::binary | std::ios::trunc) << std::string(size, '\x5A');
-        EXPECT_THROW(FlashModel(smallPart(), FaultPlan{}, path), VorantException) << size;
+    EXPECT_EQ(folder.names(), std::vector<std::string>{"flash.bin"});
+}
+
+// A file that cannot be this flash's is refused untouched, saying why: cut
+// short while it was made, the complete file of another chip, or no flash
+// file at all. The small part holds 64 KiB.
+TEST(FlashFile, RefusesAFileOfAnotherSizeNamingWhy) {
+    using Kind = FlashFileError::Kind;
+    const std::string trailer = std::string("VSIMFLSH") + std::string(8, '\0');
+    const std::tuple<std::string, Kind, const char*> cases[] = {
+        {std::string(32 * 1024, '\xFF'), Kind::Truncated, "is truncated: it holds 32768 bytes and no status trailer"},
+        {std::string(5, '\xFF'), Kind::Truncated, "is truncated: it holds 5 bytes"},
+        {std::string(32 * 1024, '\xFF') + trailer, Kind::OtherChip, "of a chip with 32768 bytes of flash"},
+        {std::string(128 * 1024, '\xFF') + trailer, Kind::OtherChip, "of a chip with 131072 bytes of flash"},
+        {std::string(128 * 1024, '\x5A'), Kind::Unusable, "not a simulated flash file"},
+        {std::string(64 * 1024 + FlashFile::kTrailerBytes, '\x5A'), Kind::Unusable, "status trailer is missing"},
+    };
+    ScratchFolder folder;
+    const std::string path = folder.file("flash.bin");
+    for (const auto& [contents, kind, reason] : cases) {
+        std::ofstream(path, std::ios::binary | std::ios::trunc) << contents;
+        try {
+            FlashModel(smallPart(), FaultPlan{}, path);
+            ADD_FAILURE() << reason << ": accepted";
+        } catch (const FlashFileError& e) {
+            EXPECT_EQ(e.kind(), kind) << e.what();
+            EXPECT_NE(std::string(e.what()).find("flash file '" + path + "' "), std::string::npos) << e.what();
+            EXPECT_NE(std::string(e.what()).find(reason), std::string::npos) << e.what();
+            if (contents.size() != 64 * 1024 + FlashFile::kTrailerBytes) {
+                EXPECT_NE(std::string(e.what()).find("this chip holds 65552"), std::string::npos) << e.what();
+            }
+        }
         std::ifstream in(path, std::ios::binary);
-        EXPECT_EQ(std::string(std::istreambuf_iterator<char>(in), {}), std::string(size, '\x5A'));
+        EXPECT_TRUE(std::string(std::istreambuf_iterator<char>(in), {}) == contents) << reason;
+        EXPECT_EQ(folder.names(), std::vector<std::string>{"flash.bin"});
     }
-    std::filesystem::remove(path);
+}
+
+// A new file appears whole or not at all: where writes stop part way (a
+// file size limit, as on a full disk) the creation fails naming how far it
+// got, and neither the file nor its temporary file is left behind. Runs in
+// a child so the limit binds nothing else.
+TEST(FlashFile, CreationThatRunsOutOfSpaceLeavesNoFile) {
+    ScratchFolder folder;
+    const std::string path = folder.file("flash.bin");
+    const std::string outcome = inLimitedChild(64 * 1024, [&]() -> std::string {
+        try {
+            FlashFile file(path, 128 * 1024);
+            return "created";
+        } catch (const FlashFileError& e) {
+            return std::string(e.kind() == FlashFileError::Kind::DiskFull ? "disk full: " : "other: ") + e.what();
+        }
+    });
+    EXPECT_EQ(outcome, "disk full: flash file '" + path +
+                           "' cannot be created: the file size limit is reached after 65536 of its 131088 bytes; "
+                           "no file was made");
+    EXPECT_TRUE(folder.names().empty());
+    FlashFile file(path, 128 * 1024);  // without the limit
+    EXPECT_EQ(std::filesystem::file_size(path), 128 * 1024 + FlashFile::kTrailerBytes);
+    EXPECT_EQ(folder.names(), std::vector<std::string>{"flash.bin"});
 }
 
 // The facts a chip takes from its part; the register-2 read opcode in
