@@ -7,12 +7,12 @@
 
 namespace vorant::formats {
 
-FlashImage readBinaryImage(const std::string& path) {
+FlashImage readBinaryImage(const std::string& path, std::uint64_t offset) {
     InputFile file = openInputFile(path);
-    if (file.size > FlashImage::kMaxBytes) {
-        throw FormatError(path + ": " + std::to_string(file.size) +
-                          " bytes is larger than the largest supported image (" +
-                          std::to_string(FlashImage::kMaxBytes) + " bytes)");
+    if (offset + file.size > kLargestFlashBytes) {
+        throw FormatError(path + ": " + std::to_string(file.size) + " bytes from offset " + std::to_string(offset) +
+                          " reach past the largest flash there is (" + std::to_string(kLargestFlashBytes) +
+                          " bytes)");
     }
     std::vector<unsigned char> bytes(static_cast<std::size_t>(file.size));
     if (!bytes.empty()) {
@@ -22,7 +22,7 @@ FlashImage readBinaryImage(const std::string& path) {
                               " of " + std::to_string(bytes.size()) + " bytes");
         }
     }
-    return FlashImage(std::move(bytes));
+    return FlashImage(std::vector<ImageRange>{ImageRange{offset, std::move(bytes)}});
 }
 
 }  // namespace vorant::formats

@@ -2,30 +2,56 @@
 #include "host/ConfigData.h"
 
 #include <cstddef>
+#include <cstdint>
 #include <limits>
 #include <vector>
 
 namespace vorant::formats {
 
-// Configuration data held in memory, laid out from flash address 0: byte k
-// of the image is the flash byte at address k. The image ends at its last
-// data byte; holes inside it already read 0xFF.
+// The largest flash a part can describe (its DEVICE_SIZE counts bits in a
+// signed 32-bit number): 256 MiB. Image data past it fit no part.
+inline constexpr std::uint64_t kLargestFlashBytes = std::uint64_t{1} << 28;
+
+// Bytes bound for consecutive flash addresses from `address` on.
+struct ImageRange {
+    std::uint64_t address = 0;
+    std::vector<unsigned char> bytes;
+
+    std::uint64_t end() const { return address + bytes.size(); }
+};
+
+// Configuration data held in memory as the address ranges the file names,
+// so memory follows the data, never the highest address: a few bytes at
+// the top of a 256 MiB flash cost a few bytes.
 //
-// next() hands out one page per call. Whole pages point straight into the
-// image; only a short tail is copied, into one page buffer that is reused,
-// and padded with 0xFF because the device always takes a full page of bits.
+// To the device it reads as one image laid out from flash address 0 to its
+// last data byte, the holes (and the space below the first range) reading
+// 0xFF. next() hands out one page per call: a page inside one range points
+// straight into it; any other page is put together in one reused page
+// buffer, padded with 0xFF, because the device always takes a full page of
+// bits.
 class FlashImage final : public ConfigDataReader {
 public:
-    // The largest image whose size in bits still fits dataSize()'s unsigned
+    // The largest span whose size in bits still fits dataSize()'s unsigned
     // count: just under 512 MiB.
-    static constexpr std::size_t kMaxBytes = std::numeric_limits<unsigned>::max() / 8;
+    static constexpr std::uint64_t kMaxBytes = std::numeric_limits<unsigned>::max() / 8;
 
-    // Throws FormatError when the image is larger than kMaxBytes.
+    // A whole image from address 0.
     explicit FlashImage(std::vector<unsigned char> bytes);
+    // Ranges in any order; empty ones are dropped, touching ones joined.
+    // Throws FormatError when two overlap or the span passes kMaxBytes.
+    explicit FlashImage(std::vector<ImageRange> ranges);
 
-    const std::vector<unsigned char>& bytes() const { return bytes_; }
-    std::size_t byteSize() const { return bytes_.size(); }
-    bool empty() const { return bytes_.empty(); }
+    // Sorted by address, disjoint, none empty.
+    const std::vector<ImageRange>& ranges() const { return ranges_; }
+    // One past the last data byte: the span the device sees.
+    std::uint64_t byteSize() const { return ranges_.empty() ? 0 : ranges_.back().end(); }
+    // Bytes the file really holds.
+    std::uint64_t dataBytes() const;
+    bool empty() const { return ranges_.empty(); }
+    // The span from address 0 with its holes filled with 0xFF. Costs the
+    // whole span in memory: for tests and small images.
+    std::vector<unsigned char> denseBytes() const;
 
     unsigned dataSize() override;
     void rewind() override;
@@ -35,9 +61,10 @@ public:
     int next(const char** data, int* address, int maxBits) override;
 
 private:
-    std::vector<unsigned char> bytes_;
-    std::size_t cursor_ = 0;
-    std::vector<unsigned char> tailPage_;
+    std::vector<ImageRange> ranges_;
+    std::uint64_t cursor_ = 0;
+    std::size_t firstRange_ = 0;  // the first range that ends after the cursor
+    std::vector<unsigned char> page_;
 };
 
 }  // namespace vorant::formats

@@ -184,13 +184,17 @@ private:
         extent_ = std::max(extent_, end);
     }
 
-    // The image from address 0 to the last data byte; the rest reads 0xFF.
-    std::vector<unsigned char> layOut() {
-        std::vector<unsigned char> image(static_cast<std::size_t>(extent_), 0xFF);
-        for (const Run& run : runs_) std::memcpy(image.data() + run.address, data_.data() + run.offset, run.count);
+    // The records' data as address ranges; the image joins touching ones.
+    std::vector<ImageRange> layOut() {
+        std::vector<ImageRange> ranges;
+        ranges.reserve(runs_.size());
+        for (const Run& run : runs_) {
+            const auto first = data_.begin() + static_cast<std::ptrdiff_t>(run.offset);
+            ranges.push_back(ImageRange{run.address, std::vector<unsigned char>(first, first + static_cast<std::ptrdiff_t>(run.count))});
+        }
         data_ = {};
         runs_ = {};
-        return image;
+        return ranges;
     }
 
     // Data bytes bound for [address, address + count), kept at `offset` of data_.

@@ -7,12 +7,10 @@
 
 namespace vorant::formats {
 
-// The highest extent a HEX image may reach: 256 MiB. A part's DEVICE_SIZE
-// counts bits in a signed 32-bit number, so no flash holds more; an image
-// beyond it fits no part, and laying it out would cost memory for nothing.
-inline constexpr std::uint64_t kMaxIntelHexImageBytes = std::uint64_t{1} << 28;
+// The highest extent a HEX image may reach: the largest flash there is.
+inline constexpr std::uint64_t kMaxIntelHexImageBytes = kLargestFlashBytes;
 
-// Intel HEX (.hex, .mcs) into an image laid out from flash address 0.
+// Intel HEX (.hex, .mcs) into an image of the address ranges its records name.
 //
 // Records taken: 00 data, 01 end of file, 02 extended segment address,
 // 04 extended linear address; 03 and 05 (start addresses) are accepted and
@@ -33,9 +31,9 @@ inline constexpr std::uint64_t kMaxIntelHexImageBytes = std::uint64_t{1} << 28;
 //   - data reaching past kMaxIntelHexImageBytes
 //   - a file that ends without an end-of-file record (names its last line)
 //
-// The records are collected first and the image is laid out once the whole
-// file is accepted, so a small file naming a far address costs no memory
-// before it is refused.
+// The records are collected first and the ranges built once the whole file
+// is accepted; memory follows the data, so a small file naming a far
+// address costs no memory.
 FlashImage readIntelHexImage(const std::string& path);
 
 // The same from a stream; sourceName stands for the file in messages, and

@@ -71,7 +71,7 @@ TEST(Writers, AbandonedOrDiscardedWriteLeavesTheTargetAndAPublishedReadbackReads
         writer.reset();
         EXPECT_TRUE(readFile(path) == earlier) << name << ": replaced before the host published it";
         EXPECT_TRUE(PendingOutputs::commitAll().empty());
-        EXPECT_EQ(loadFlashImage(path).bytes(), flash) << name;
+        EXPECT_EQ(loadFlashImage(path).denseBytes(), flash) << name;
         EXPECT_TRUE(!*lineEnd || readFile<std::string>(path).find(lineEnd) == 15) << name << ": line end after the first record";
     }
 }
@@ -89,7 +89,7 @@ TEST(SrecCat, ItsFilesReadAsItConvertsThemAndOursConvertBackToTheData) {
         writeFile(dir.file("in.bin"), randomBytes(size, size));
         ASSERT_TRUE(srecCat(in + " -binary -offset " + std::to_string(offset) + " -o " + hex + " -intel " + options));
         ASSERT_TRUE(srecCat(hex + " -intel -fill 0xFF 0 " + std::to_string(offset + size) + " -o " + back + " -binary"));
-        EXPECT_EQ(loadFlashImage(dir.file(name)).bytes(), readFile(dir.file("back.bin"))) << name;
+        EXPECT_EQ(loadFlashImage(dir.file(name)).denseBytes(), readFile(dir.file("back.bin"))) << name;
     }
     const Bytes flash = randomBytes(0x20000 + 77, 99);
     for (const auto& [name, recordBytes, offset] : {std::tuple{"ours.mcs", 16, 0}, {"ours.hex", 32, 0x1F000}}) {

@@ -1,0 +1,109 @@
+#include "formats/SRecordWriter.h"
+
+#include "formats/BitReversal.h"
+#include "formats/ConfigDataFiles.h"
+
+#include <algorithm>
+#include <cstdio>
+
+namespace vorant::formats {
+namespace {
+
+constexpr char kHexDigits[] = "0123456789ABCDEF";
+constexpr std::size_t kRecordBytes = 32;
+constexpr std::size_t kTextFlushSize = 64 * 1024;
+constexpr char kHeader[] = "vorant-spi readback";
+
+std::string hexNumber(std::uint64_t value) {
+    char text[24];
+    std::snprintf(text, sizeof text, "0x%llX", static_cast<unsigned long long>(value));
+    return text;
+}
+
+int dataTypeOf(const std::string& path) {
+    const std::string extension = lowerCaseExtension(path);
+    if (extension == ".s19") return 1;
+    if (extension == ".s28") return 2;
+    return 3;
+}
+
+}  // namespace
+
+SRecordWriter::SRecordWriter(const std::string& path)
+    : AtomicFileWriter(path), dataType_(dataTypeOf(path)), addressBytes_(dataType_ + 1) {
+    pending_.reserve(kRecordBytes);
+    appendRecord(0, 0, 2, reinterpret_cast<const unsigned char*>(kHeader), sizeof kHeader - 1);
+}
+
+void SRecordWriter::appendByte(unsigned value) {
+    text_ += kHexDigits[(value >> 4) & 0xF];
+    text_ += kHexDigits[value & 0xF];
+    sum_ += value;
+}
+
+void SRecordWriter::appendRecord(int type, std::uint64_t address, int addressBytes, const unsigned char* data,
+                                 std::size_t count) {
+    sum_ = 0;
+    text_ += 'S';
+    text_ += static_cast<char>('0' + type);
+    appendByte(static_cast<unsigned>(count) + static_cast<unsigned>(addressBytes) + 1);
+    for (int shift = 8 * (addressBytes - 1); shift >= 0; shift -= 8) appendByte((address >> shift) & 0xFF);
+    for (std::size_t i = 0; i < count; ++i) appendByte(data[i]);
+    appendByte(0xFF - (sum_ & 0xFF));
+    text_ += '\n';
+}
+
+void SRecordWriter::flushRecord() {
+    if (pending_.empty()) return;
+    appendRecord(dataType_, recordAddress_, addressBytes_, pending_.data(), pending_.size());
+    ++records_;
+    pending_.clear();
+}
+
+bool SRecordWriter::writeText() {
+    out().write(text_.data(), static_cast<std::streamsize>(text_.size()));
+    text_.clear();
+    return checkStream();
+}
+
+bool SRecordWriter::writeData(const unsigned char* data, int offset, int bits, int /*reserved*/) {
+    std::size_t count = 0;
+    if (!acceptData(data, offset, bits, count)) return false;
+    if (count == 0) return true;
+    auto address = static_cast<std::uint64_t>(offset);
+    if (address < nextAddress_)
+        return fail(targetName() + ": data at " + hexNumber(address) + " arrive below data already written (up to " +
+                    hexNumber(nextAddress_ - 1) + "); S-record output takes data in ascending order");
+    const std::uint64_t reach = std::uint64_t{1} << (8 * addressBytes_);
+    if (address + count > reach)
+        return fail(targetName() + ": data up to " + hexNumber(address + count - 1) + " do not fit S" +
+                    std::to_string(dataType_) + " records (they reach " + hexNumber(reach - 1) +
+                    "); name the file .s37 or .srec");
+    if (address != nextAddress_) flushRecord();
+    while (count > 0) {
+        if (pending_.empty()) recordAddress_ = address;
+        const std::uint64_t blockEnd = (address / kRecordBytes + 1) * kRecordBytes;
+        const auto take = static_cast<std::size_t>(std::min<std::uint64_t>(count, blockEnd - address));
+        const std::size_t filled = pending_.size();
+        pending_.resize(filled + take);
+        reverseBitsOfEachByte(data, take, pending_.data() + filled);
+        data += take;
+        count -= take;
+        address += take;
+        if (address == blockEnd) flushRecord();
+    }
+    nextAddress_ = address;
+    return text_.size() < kTextFlushSize || writeText();
+}
+
+bool SRecordWriter::finishData() {
+    flushRecord();
+    // The count in the narrowest record it fits; the end record of the
+    // data records' width (S7 for S3, S8 for S2, S9 for S1).
+    if (records_ <= 0xFFFF) appendRecord(5, records_, 2, nullptr, 0);
+    else if (records_ <= 0xFFFFFF) appendRecord(6, records_, 3, nullptr, 0);
+    appendRecord(10 - dataType_, 0, addressBytes_, nullptr, 0);
+    return writeText();
+}
+
+}  // namespace vorant::formats

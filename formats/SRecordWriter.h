@@ -1,0 +1,42 @@
+#pragma once
+#include "formats/AtomicFileWriter.h"
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace vorant::formats {
+
+// Writes a readback as Motorola S-records: an S0 header, data records of
+// 32 bytes at aligned addresses, all of one type, a count record (S5, or S6
+// past 65535 records) and the matching end record. The type follows the
+// name: S1/S9 for .s19 (64 KiB), S2/S8 for .s28 (16 MiB), S3/S7 otherwise.
+// Captured bytes are bit-reversed back to flash bytes. Data arrive in
+// ascending order, as for Intel HEX; data past the type's reach are
+// refused.
+class SRecordWriter final : public AtomicFileWriter {
+public:
+    // Throws FormatError when path cannot be written; creates nothing then.
+    explicit SRecordWriter(const std::string& path);
+
+    bool writeData(const unsigned char* data, int offset, int bits, int reserved) override;
+
+private:
+    bool finishData() override;
+    void flushRecord();
+    void appendRecord(int type, std::uint64_t address, int addressBytes, const unsigned char* data,
+                      std::size_t count);
+    void appendByte(unsigned value);
+    bool writeText();
+
+    int dataType_;      // 1, 2 or 3
+    int addressBytes_;  // 2, 3 or 4
+    std::uint64_t nextAddress_ = 0;
+    std::uint64_t recordAddress_ = 0;
+    std::vector<unsigned char> pending_;
+    std::uint64_t records_ = 0;
+    std::string text_;
+    unsigned sum_ = 0;
+};
+
+}  // namespace vorant::formats
