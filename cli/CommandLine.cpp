@@ -78,7 +78,9 @@ struct ParsedValues {
     std::string index = "0";
     std::string dataWidth;
     std::string clockHz;
-    bool dataWidthGiven = false, clockGiven = false;
+    std::string offset;
+    std::string format;
+    bool dataWidthGiven = false, clockGiven = false, offsetGiven = false;
     bool debug = false, quiet = false, version = false;
     std::vector<std::string> simFaults;
 };
@@ -108,6 +110,12 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
         ->type_name("1|4");
     app.add_option("--clock", values.clockHz, "SPI clock of the simulator in Hz (default: 50000000)")
         ->type_name("HZ");
+    app.add_option("--offset", values.offset, "Flash address a binary image starts at (default: 0)")
+        ->type_name("ADDR");
+    app.add_option("--format", values.format,
+                   "Format of the image or readback file, whatever its name says: bin, ihex or srec (default: "
+                   "from the extension, else from the content)")
+        ->type_name("bin|ihex|srec");
     app.add_flag("--debug", values.debug, "Show debug traces");
     app.add_flag("--quiet", values.quiet, "Show only errors: no status lines, progress or summary");
     // For tests and demonstrations: faults the simulated chip injects.
@@ -173,6 +181,15 @@ ToolOptions toolOptions(const ParsedValues& values) {
         options.clockHz = static_cast<std::uint32_t>(wholeNumberOption(
             "--clock", values.clockHz, 1, kMaxClockHz, "give 1 to " + std::to_string(kMaxClockHz) + " Hz"));
     }
+    if (values.offsetGiven) {
+        options.image.offset = static_cast<std::uint64_t>(
+            wholeNumberOption("--offset", values.offset, 0, static_cast<long long>(formats::kLargestFlashBytes) - 1,
+                              "give an address below the largest flash (0x10000000)"));
+    }
+    if (!values.format.empty()) {
+        options.image.format = formats::formatNamed(values.format);
+        if (!options.image.format) throw UsageError("--format " + values.format + " is not known; give bin, ihex or srec");
+    }
     options.debug = values.debug;
     options.quiet = values.quiet;
     options.simFaults = values.simFaults;
@@ -208,6 +225,7 @@ CommandLine parseCommandLine(const std::vector<std::string>& arguments) {
     }
     values.dataWidthGiven = app.count("--data-width") > 0;
     values.clockGiven = app.count("--clock") > 0;
+    values.offsetGiven = app.count("--offset") > 0;
     if (values.version) {
         result.action = CommandLine::Action::ShowVersion;
         return result;

@@ -1,6 +1,7 @@
 #pragma once
 #include "cli/OperationRequest.h"
 #include "cli/PortChoice.h"
+#include "formats/ConfigDataFiles.h"
 
 #include <cstdint>
 #include <optional>
@@ -24,6 +25,7 @@ struct ToolOptions {
     bool debug = false;
     bool quiet = false;
     std::vector<std::string> simFaults;
+    formats::ImageOptions image;  // --format and --offset
 
     bool autoPart() const { return part == "auto"; }
 };

@@ -238,10 +238,10 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
 
     // Files before the port: a bad file costs no scan and creates nothing.
     PreparedRun run;
-    formats::registerStandardFormats();
+    formats::registerStandardFormats(16, options.image.format);
     run.file = request.fileOperand();
     checkFilesApart(options, info, run.file);
-    if (info.operand == OperandKind::ImageFile) run.image = openImage(run.file);
+    if (info.operand == OperandKind::ImageFile) run.image = openImage(run.file, options.image);
     if (info.operation == Operation::Readback) checkReadbackTarget(run.file);
     if (run.image && !options.autoPart()) checkImageFits(*run.image, run.file, options.part);
 

@@ -12,11 +12,11 @@
 
 namespace vorant::cli {
 
-std::unique_ptr<ConfigDataReader> openImage(const std::string& path) {
+std::unique_ptr<ConfigDataReader> openImage(const std::string& path, const formats::ImageOptions& options) {
     try {
-        return formats::openConfigData(path);
+        return formats::openConfigData(path, options);
     } catch (const formats::FormatError& error) {
-        throw UsageError(std::string(error.what()) + "; give a readable .bin, .hex or .mcs image");
+        throw UsageError(std::string(error.what()) + "; give a readable binary, Intel HEX or S-record image");
     }
 }
 
@@ -25,7 +25,7 @@ void checkImageFits(ConfigDataReader& image, const std::string& path, const std:
         ConstraintsManager::instance().getDeviceLongProperty(partName.c_str(), "DEVICE_SIZE");
     const std::int64_t imageBits = image.dataSize();
     if (imageBits <= deviceBits) return;
-    throw UsageError(path + " reaches " + std::to_string(imageBits / 8) + " bytes (from address 0) but " + partName +
+    throw UsageError(path + " reaches address " + std::to_string(imageBits / 8) + " but " + partName +
                      " holds " + sizeText(deviceBits / 8) + "; use a larger part or a smaller image");
 }
 

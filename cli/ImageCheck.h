@@ -1,4 +1,5 @@
 #pragma once
+#include "formats/ConfigDataFiles.h"
 #include "host/ConfigData.h"
 
 #include <memory>
@@ -6,11 +7,11 @@
 
 namespace vorant::cli {
 
-// Registers the readback writers and opens the configuration data of
-// program, verify and checksum (.bin raw, .hex/.mcs Intel HEX). Throws
-// UsageError naming the file when it is missing, unreadable, empty or
-// malformed.
-std::unique_ptr<ConfigDataReader> openImage(const std::string& path);
+// Opens the configuration data of program, verify and checksum: binary
+// (at --offset), Intel HEX or S-records, by --format, extension or content.
+// Throws UsageError naming the file when it is missing, unreadable, empty,
+// malformed or of no known format.
+std::unique_ptr<ConfigDataReader> openImage(const std::string& path, const formats::ImageOptions& options = {});
 
 // Throws UsageError when the image reaches past the end of the part.
 void checkImageFits(ConfigDataReader& image, const std::string& path, const std::string& partName);

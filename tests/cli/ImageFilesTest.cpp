@@ -1,0 +1,70 @@
+// Image files on the command line: S-records and extension-less HEX are
+// read as what they are, a binary lands at --offset, --format wins, a
+// readback writes S-records, and misuse is refused before any scan.
+#include "tests/cli/ToolTestFixture.h"
+
+#include <cstdlib>
+
+namespace vorant::cli::test {
+namespace {
+
+std::string flashWith(const std::string& data, std::size_t offset = 0) {
+    return std::string(kSimBytes, '\xff').replace(offset, data.size(), data);
+}
+
+bool srecCat(const std::string& arguments) {
+    return std::system(("srec_cat " + arguments + " >/dev/null 2>&1").c_str()) == 0;
+}
+
+TEST_F(ToolTest, EveryImageFormatProgramsWhereItsAddressesSay) {
+    if (!srecCat("-VERSion")) GTEST_SKIP() << "srec_cat is not on PATH";
+    const std::string data = randomBytes(3000, 31);
+    write("data.bin", data);
+    const fs::path in = dir / "data.bin";
+    ASSERT_TRUE(srecCat(in.string() + " -binary -offset 0x10000 -o " + (dir / "image.srec").string() + " -motorola"));
+    ASSERT_TRUE(srecCat(in.string() + " -binary -offset 0x20000 -o " + (dir / "firmware").string() + " -intel"));
+    const struct {
+        Args args;
+        std::size_t offset;
+    } runs[] = {
+        {{"program", "image.srec", "-e", "-v"}, 0x10000},
+        {{"program", "firmware", "-e", "-v"}, 0x20000},  // HEX told by its content
+        {{"--offset", "0x30000", "program", "data.bin", "-e", "-v"}, 0x30000},
+        {{"--format", "bin", "--offset", "4096", "program", "data.bin", "-e", "-v"}, 4096},
+    };
+    for (const auto& [args, offset] : runs) {
+        ok(kSim + args);
+        ok(kSim + Args{"readback", "-f", "out.bin"});
+        EXPECT_TRUE(read("out.bin") == flashWith(data, offset)) << args[args.size() - 3];
+    }
+    // A readback as S-records converts back to the flash.
+    ok(kSim + Args{"readback", "-f", "out.s37"});
+    ASSERT_TRUE(srecCat((dir / "out.s37").string() + " -motorola -o " + (dir / "back.bin").string() + " -binary"));
+    EXPECT_TRUE(read("back.bin") == flashWith(data, 4096));
+    ok(kSim + Args{"--format", "srec", "readback", "-f", "-"});
+}
+
+TEST_F(ToolTest, ImageMisuseIsRefusedBeforeAnyScan) {
+    write("data.bin", randomBytes(100, 3));
+    write("data.hex", ":0100020042BB\n:00000001FF\n");
+    write("blob.dat", std::string("\x7F" "ELF\x02\x01", 6));
+    const struct {
+        Args args;
+        const char* line;
+    } runs[] = {
+        {{"--offset", "0x10", "program", "data.hex"}, "files carry their own addresses"},
+        {{"program", "blob.dat"}, "name it with --format bin|ihex|srec"},
+        {{"--format", "elf", "program", "data.bin"}, "--format elf is not known"},
+        {{"--offset", "0x1FFFFF", "program", "data.bin"}, "reaches address"},
+        {{"--format", "ihex", "program", "data.bin"}, "starts with ':'"},
+    };
+    for (const auto& [args, line] : runs) {
+        const Result result = run(kSim + args);
+        EXPECT_EQ(result.status, 2) << result.text();
+        EXPECT_TRUE(has(result.err, line)) << result.text();
+        EXPECT_FALSE(fs::exists(dir / "flash.bin")) << "a refused run made the flash file";
+    }
+}
+
+}  // namespace
+}  // namespace vorant::cli::test
