@@ -35,7 +35,27 @@ bool allBytesAre(const std::vector<std::uint8_t>& bytes, std::uint8_t value) {
     return true;
 }
 
-void checkChipAnswers(ChipProbe& probe, ScanPort& port, const std::string& part) {
+// The JEDEC ID the part answers; empty for a part identified by its RES
+// signature alone.
+std::string partJedecId(const std::string& part) {
+    const std::string jedec = partText(part, "JEDEC_ID");
+    if (!jedec.empty()) return jedec;
+    return partFlag(part, "USE_RES") ? std::string() : partText(part, "IDCODE");
+}
+
+void checkChipIsThePart(const std::vector<std::uint8_t>& id, const std::string& part) {
+    const std::string expected = partJedecId(part);
+    const std::string read = hexText(id);
+    if (expected.empty() || UT_STR::ICompare(expected.c_str(), read.c_str()) == 0) return;
+    std::string names;
+    for (const std::string& name : ConstraintsManager::instance().partsWithId(read))
+        names += (names.empty() ? "" : ", ") + name;
+    throw ToolFailure("the chip answers the JEDEC ID " + read + (names.empty() ? "" : " (" + names + ")") +
+                      ", not " + part + "'s " + expected +
+                      "; nothing was written: name the right part, or give --force to write anyway");
+}
+
+void checkChipAnswers(ChipProbe& probe, ScanPort& port, const std::string& part, bool idMustMatch) {
     const auto id = probe.read(partText(part, "IDENTIFICATION_INSTRUCTION"), kIdBytes);
     if (!id) throw ToolFailure("the chip's ID could not be read" + portReason(port) + "; nothing was written");
     // A chip in deep power-down, or none at all, leaves MISO at one level.
@@ -43,6 +63,7 @@ void checkChipAnswers(ChipProbe& probe, ScanPort& port, const std::string& part)
         throw ToolFailure("no chip answered the ID read (it read " + hexText(*id) +
                          "): check the connection, or wake a chip in deep power-down with 'vorant-spi --part " +
                          part + " release'; nothing was written");
+    if (idMustMatch) checkChipIsThePart(*id, part);
 }
 
 // The status register 1 bits the part labels BP0, BP1, ...
@@ -73,7 +94,7 @@ void checkNoBlockProtection(ChipProbe& probe, ScanPort& port, const std::string&
 
 void checkChipBeforeWrite(ScanPort& port, const std::string& part, const WriteCheck& check) {
     ChipProbe probe(port);
-    if (check.chipMustAnswer) checkChipAnswers(probe, port, part);
+    if (check.chipMustAnswer) checkChipAnswers(probe, port, part, check.idMustMatch);
     if (check.noBlockProtection && !partFlag(part, "USE_UNLOCKSR")) checkNoBlockProtection(probe, port, part);
 }
 

@@ -10,6 +10,9 @@ struct WriteCheck {
     // Read the ID first: a chip that answers nothing (deep power-down, no
     // chip) would turn an erase into a time-out of minutes.
     bool chipMustAnswer = false;
+    // ... and answer the part's own JEDEC ID: a write meant for another
+    // chip (another size, other opcodes) would ruin this one.
+    bool idMustMatch = false;
     // Refuse a set block-protect bit: on a part whose operations do not
     // clear them (no USE_UNLOCKSR) the chip would ignore every write.
     bool noBlockProtection = false;

@@ -81,7 +81,7 @@ struct ParsedValues {
     std::string offset;
     std::string format;
     bool dataWidthGiven = false, clockGiven = false, offsetGiven = false;
-    bool debug = false, quiet = false, version = false;
+    bool debug = false, quiet = false, version = false, force = false;
     std::vector<std::string> simFaults;
 };
 
@@ -116,6 +116,8 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
                    "Format of the image or readback file, whatever its name says: bin, ihex or srec (default: "
                    "from the extension, else from the content)")
         ->type_name("bin|ihex|srec");
+    app.add_flag("--force", values.force,
+                 "Write to a chip whose JEDEC ID is not the part's (the check before every write is skipped)");
     app.add_flag("--debug", values.debug, "Show debug traces");
     app.add_flag("--quiet", values.quiet, "Show only errors: no status lines, progress or summary");
     // For tests and demonstrations: faults the simulated chip injects.
@@ -192,6 +194,7 @@ ToolOptions toolOptions(const ParsedValues& values) {
     }
     options.debug = values.debug;
     options.quiet = values.quiet;
+    options.force = values.force;
     options.simFaults = values.simFaults;
     // Checked now so a bad fault is a usage error before anything runs.
     simFaultPlan(options.simFaults);

@@ -24,6 +24,7 @@ struct ToolOptions {
     std::optional<std::uint32_t> clockHz;
     bool debug = false;
     bool quiet = false;
+    bool force = false;  // write to a chip that answers another ID
     std::vector<std::string> simFaults;
     formats::ImageOptions image;  // --format and --offset
 

@@ -29,6 +29,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cstdio>
+#include <cstdlib>
 #include <memory>
 #include <optional>
 
@@ -200,9 +201,12 @@ void checkSignatureKnown(const std::string& part, const OperationInfo& info) {
 }
 
 // What the tool checks on a cable before an operation that writes. With
-// --part auto the identification has already read the ID.
-WriteCheck writeCheckFor(Operation operation, bool identified) {
+// --part auto the identification has already read the ID. --force, or the
+// plug-in's own switch QRX_VORANT_SKIPIDCODECHECK, lets a write go to a
+// chip that answers another ID.
+WriteCheck writeCheckFor(Operation operation, bool identified, bool force) {
     WriteCheck check;
+    check.idMustMatch = !force && std::getenv("QRX_VORANT_SKIPIDCODECHECK") == nullptr;
     switch (operation) {
     case Operation::Program:
     case Operation::Erase:
@@ -260,7 +264,7 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
         run.device = createDevice(run.part);
         // A recording has no chip to ask; its player checks.
         if (!run.session->port().outputMode())
-            checkChipBeforeWrite(run.session->port(), run.part, writeCheckFor(info.operation, identification.has_value()));
+            checkChipBeforeWrite(run.session->port(), run.part, writeCheckFor(info.operation, identification.has_value(), options.force));
     } catch (...) {
         run.session->abandon();
         throw;

@@ -89,6 +89,9 @@ TEST_F(ToolTest, AChipThatCannotTakeAWriteIsRefusedFirst) {
         {noUnlock + Args{"--sim-fault", "protected", "erase"},
          "the chip is write-protected: BP2, BP1, BP0 set in status register 1 (0x1C)"},
         {noUnlock + Args{"--sim-fault", "protected", "program", "image.bin", "-e"}, "'vorant-spi --part NOUNLOCK unlock'"},
+        // A part named for another chip: its size and opcodes could ruin it.
+        {{"--part", "W25Q16JV", "--chip", "W25Q32JV", "--port", "sim:other.sim", "erase"},
+         "the chip answers the JEDEC ID EF4016 (W25Q32JV), not W25Q16JV's EF4015"},
     };
     for (const auto& [args, line] : runs) {
         const Result result = run(args);
@@ -96,6 +99,8 @@ TEST_F(ToolTest, AChipThatCannotTakeAWriteIsRefusedFirst) {
         EXPECT_TRUE(has(result.err, line)) << result.text();
         EXPECT_FALSE(has(result.out, "Erasing Device")) << result.text();
     }
+    // --force writes all the same.
+    ok(Args{"--part", "W25Q16JV", "--chip", "W25Q32JV", "--force", "erase"});
     // After the unlock the same chip takes the job.
     ok(noUnlock + Args{"--sim-fault", "protected", "unlock"});
     ok(noUnlock + Args{"program", "image.bin", "-e", "-v"});
