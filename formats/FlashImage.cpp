@@ -63,11 +63,35 @@ void FlashImage::rewind() {
     firstRange_ = 0;
 }
 
-int FlashImage::next(const char** data, int* address, int maxBits) {
+namespace {
+
+void checkPageBits(int maxBits) {
     if (maxBits <= 0 || maxBits % 8 != 0) {
         throw std::invalid_argument("configuration data are read in whole bytes; a page of " +
                                     std::to_string(maxBits) + " bits cannot be served");
     }
+}
+
+}  // namespace
+
+int FlashImage::nextPiece(const char** data, int* address, int maxBits) {
+    checkPageBits(maxBits);
+    const std::uint64_t pageBytes = static_cast<std::uint64_t>(maxBits) / 8;
+    while (firstRange_ < ranges_.size() && ranges_[firstRange_].end() <= cursor_) ++firstRange_;
+    if (firstRange_ >= ranges_.size()) return 0;
+    const ImageRange& range = ranges_[firstRange_];
+    cursor_ = std::max(cursor_, range.address);
+    const std::uint64_t pageEnd = (cursor_ / pageBytes + 1) * pageBytes;
+    const std::uint64_t pieceEnd = std::min(pageEnd, range.end());
+    *data = reinterpret_cast<const char*>(range.bytes.data() + (cursor_ - range.address));
+    if (address) *address = static_cast<int>(cursor_);
+    const auto bits = static_cast<int>((pieceEnd - cursor_) * 8);
+    cursor_ = pieceEnd;
+    return bits;
+}
+
+int FlashImage::next(const char** data, int* address, int maxBits) {
+    checkPageBits(maxBits);
     const std::uint64_t end = byteSize();
     if (cursor_ >= end) return 0;
 

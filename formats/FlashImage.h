@@ -59,6 +59,8 @@ public:
     // anything else throws std::invalid_argument rather than silently
     // ending the data.
     int next(const char** data, int* address, int maxBits) override;
+    // The ranges' bytes only, cut at page bounds; points into the ranges.
+    int nextPiece(const char** data, int* address, int maxBits) override;
 
 private:
     std::vector<ImageRange> ranges_;

@@ -18,6 +18,15 @@ public:
     // 0xFF past the data), *address to its flash byte address. Returns the
     // number of bits delivered; 0 when no data remain.
     virtual int next(const char** data, int* address, int maxBits) = 0;
+
+    // Added after the operations above, so their places in the table stay.
+    // The data exactly as the file holds them, one piece per call, in
+    // ascending address order: a piece is at most maxBits long and never
+    // crosses a multiple of maxBits / 8 bytes (a page), and the holes
+    // between the file's ranges are skipped. Same contract as next()
+    // otherwise; rewind() restarts both. By default the pieces are next()'s
+    // chunks: a reader that knows no holes has none.
+    virtual int nextPiece(const char** data, int* address, int maxBits);
 };
 
 // Writes a readback file. Pages arrive as captured: each buffer byte holds

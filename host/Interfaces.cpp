@@ -13,6 +13,7 @@ ScanPort::~ScanPort() = default;
 const char* ScanPort::failureReason() { return nullptr; }
 bool ScanPort::connectionLost() { return false; }
 ConfigDataReader::~ConfigDataReader() = default;
+int ConfigDataReader::nextPiece(const char** data, int* address, int maxBits) { return next(data, address, maxBits); }
 ConfigDataWriter::~ConfigDataWriter() = default;
 CifReader::~CifReader() = default;
 

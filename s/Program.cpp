@@ -66,9 +66,6 @@ bool Type1SPIDevice::program(int index, UT_CMDARGS* args) {
     }
 
     const std::size_t frameBits = static_cast<std::size_t>(totalShiftSize_);
-    RLBitVec tdiMask(frameBits, true);
-    RLBitVec tdo(frameBits, false);
-    RLBitVec tdoMask(frameBits, false);
     reader->rewind();
     DEVICE_MESSAGE().issueStatus("'%d': Programming Flash.\n", index);
     // One frame for the whole run: only the address and data fields change
@@ -90,33 +87,13 @@ bool Type1SPIDevice::program(int index, UT_CMDARGS* args) {
         // reader's padded buffer.
         frame.updateBitField(chunk, dataStartIndex_, pageSize_, true);
 
-        // A page the port could not send is not in the flash: going on
-        // would end in a misleading time-out, or in a flash with a hole.
-        bool sent = spienable(index, args);
-        port().comment("//Loading device with 'page program' instruction.\n");
-        sent = port().shift(ScanStage::kWhole, &frame, &tdiMask, &tdo, &tdoMask) && sent;
-        sent = port().wait(0, true) && sent;
-        // A recording cannot poll: it waits the longest a page may take.
-        sent = port().wait(fileMode ? programMaxWaitTime_ : programWaitTime_, true) && sent;
-        if (!sent) {
-            DEVICE_MESSAGE().issueError(
-                "'%d': Programming terminated, the page at address 0x%X could not be sent to the device.\n",
-                index, address);
-            spidisable(index, args);
-            return false;
+        const PageOutcome outcome = writePage(index, args, frame, fileMode);
+        if (outcome == PageOutcome::Cancelled) {
+            cancelled = true;  // while the page was still being written
+            break;
         }
-        if (!fileMode && usesPolling() && !checkStatus(index, programMaxWaitTime_, programWaitTimeInc_)) {
-            if (lastPollEnd_ == PollEnd::ConnectionLost) {
-                DEVICE_MESSAGE().issueError(
-                    "'%d': Programming terminated at address 0x%X, the connection to the device was lost.\n",
-                    index, address);
-            } else if (lastPollEnd_ == PollEnd::Cancelled) {
-                // Cancelled while the page was still being written.
-                cancelled = true;
-                break;
-            } else {
-                DEVICE_MESSAGE().issueError("'%d': Device has exceeded the allocated time.\n", index);
-            }
+        if (outcome != PageOutcome::Written) {
+            reportPageFailure(index, outcome, address);
             spidisable(index, args);
             return false;
         }
@@ -133,6 +110,53 @@ bool Type1SPIDevice::program(int index, UT_CMDARGS* args) {
 
     if (result && (switchGiven(args, "-v") || switchGiven(args, "-verify"))) result = verify(index, args);
 
+    return finishProgramming(index, args, result);
+}
+
+// A page the port could not send is not in the flash: going on would end in
+// a misleading time-out, or in a flash with a hole.
+Type1SPIDevice::PageOutcome Type1SPIDevice::writePage(int index, UT_CMDARGS* args, RLBitVec& frame, bool fileMode) {
+    const std::size_t frameBits = frame.length();
+    RLBitVec tdiMask(frameBits, true);
+    RLBitVec tdo(frameBits, false);
+    RLBitVec tdoMask(frameBits, false);
+    bool sent = spienable(index, args);
+    port().comment("//Loading device with 'page program' instruction.\n");
+    sent = port().shift(ScanStage::kWhole, &frame, &tdiMask, &tdo, &tdoMask) && sent;
+    sent = port().wait(0, true) && sent;
+    // A recording cannot poll: it waits the longest a page may take.
+    sent = port().wait(fileMode ? programMaxWaitTime_ : programWaitTime_, true) && sent;
+    if (!sent) return PageOutcome::NotSent;
+    if (fileMode || !usesPolling() || checkStatus(index, programMaxWaitTime_, programWaitTimeInc_))
+        return PageOutcome::Written;
+    switch (lastPollEnd_) {
+    case PollEnd::ConnectionLost: return PageOutcome::ConnectionLost;
+    case PollEnd::Cancelled: return PageOutcome::Cancelled;
+    default: return PageOutcome::TimedOut;
+    }
+}
+
+void Type1SPIDevice::reportPageFailure(int index, PageOutcome outcome, unsigned address) {
+    switch (outcome) {
+    case PageOutcome::NotSent:
+        DEVICE_MESSAGE().issueError(
+            "'%d': Programming terminated, the page at address 0x%X could not be sent to the device.\n", index,
+            address);
+        break;
+    case PageOutcome::ConnectionLost:
+        DEVICE_MESSAGE().issueError(
+            "'%d': Programming terminated at address 0x%X, the connection to the device was lost.\n", index, address);
+        break;
+    case PageOutcome::TimedOut:
+        DEVICE_MESSAGE().issueError("'%d': Device has exceeded the allocated time.\n", index);
+        break;
+    default: break;
+    }
+}
+
+// The end of every programming run: on success the flash is left in x4 or
+// x1 mode and its registers shown; a write disable always closes the run.
+bool Type1SPIDevice::finishProgramming(int index, UT_CMDARGS* args, bool result) {
     if (result) {
         x4Programming_ = false;
         if (const char* dataWidth = getAttribute(DeviceNS::ATTR_DATA_WIDTH)) {

@@ -16,6 +16,9 @@
 #endif
 
 class UT_CMDARGS;
+namespace vorant::device {
+struct BlockEraseType;
+}  // namespace vorant::device
 
 namespace VORANT_TYPE1SPINS {
 enum RESULT { NOT_SET = 0, WIP_SET = 1, WEL_SET = 2 };
@@ -52,6 +55,13 @@ public:
     virtual bool checkStatus(int index, int maxWait, int step);
     virtual VORANT_TYPE1SPINS::RESULT readStatus(int index, const char* bitName);
     virtual bool readElectronicSignature(int index, bool display);
+    // Programs only what the configuration data cover: each block they
+    // touch is read, left alone when it already holds the data, else erased
+    // with the largest erase that fits and rewritten with the data and the
+    // bytes around them it held; pages that end up all 0xFF are not sent.
+    // "-v"/"-verify" reads every rewritten block back. In file mode nothing
+    // can be read: every block is erased and only the data are written.
+    virtual bool programBlocks(int index, UT_CMDARGS* args);
 
     bool displayStatusRegisterBits(int index);
     bool unlockStatusRegister(int index, UT_CMDARGS* args);
@@ -77,6 +87,22 @@ private:
     // without asking the port again.
     enum class PollEnd { Idle, TimedOut, Cancelled, ConnectionLost };
     PollEnd lastPollEnd_ = PollEnd::Idle;
+
+    // One page program of a prepared frame (address and data in it), its
+    // waits and, on a cable, its polling.
+    enum class PageOutcome { Written, NotSent, TimedOut, Cancelled, ConnectionLost };
+    PageOutcome writePage(int index, UT_CMDARGS* args, RLBitVec& frame, bool fileMode);
+    void reportPageFailure(int index, PageOutcome outcome, unsigned address);
+    bool finishProgramming(int index, UT_CMDARGS* args, bool result);
+    // Reads `count` bytes from `address` page by page into `bytes`, each
+    // page's capture preloaded with `expected` (may be null: zeros), which a
+    // recording compares.
+    bool readFlash(unsigned address, unsigned char* bytes, std::size_t count, const unsigned char* expected);
+    // Write enable, the block erase with its address, the wait and, on a
+    // cable, the polling; true when the erase is proven done (or, without
+    // polling, waited out).
+    bool eraseBlock(int index, UT_CMDARGS* args, const vorant::device::BlockEraseType& type, unsigned address,
+                    bool fileMode);
 
     // Polling switch: QRX_VORANT_ENV_DONT_USE_POLLING's text, not owned.
     const char* dontUsePolling_ = nullptr;

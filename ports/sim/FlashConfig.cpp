@@ -146,6 +146,8 @@ FlashConfig FlashConfig::fromPartDatabase(const std::string& partName) {
     };
     config.opDeepPowerDown = optionalOpcode("DEEPDOWN_INSTRUCTION");
     config.opReleaseSignature = optionalOpcode("READSIGNATURE_INSTRUCTION");
+    if (part.has("BLOCKERASE32_INSTRUCTION")) config.opBlockErase32 = optionalOpcode("BLOCKERASE32_INSTRUCTION");
+    if (part.has("BLOCKERASE64_INSTRUCTION")) config.opBlockErase64 = optionalOpcode("BLOCKERASE64_INSTRUCTION");
 
     const bool usesRes = part.flag("USE_RES");
     // The JEDEC ID; a part without one known answers FF FF FF, as MISO
@@ -186,6 +188,10 @@ FlashConfig FlashConfig::fromPartDatabase(const std::string& partName) {
     config.bulkEraseUs = part.countOr("SIM_BULK_ERASE_US", config.bulkEraseUs);
     // A typical 4 KiB sector erase takes tens of milliseconds.
     config.sectorEraseUs = part.countOr("SIM_SECTOR_ERASE_US", 45000);
+    // Typical 32 KiB and 64 KiB block erases of current parts; the part's
+    // own SIM_ keys set them, never the plug-in's waits.
+    config.block32EraseUs = part.countOr("SIM_BLOCK32_ERASE_US", 120000);
+    config.block64EraseUs = part.countOr("SIM_BLOCK64_ERASE_US", 150000);
     config.writeStatusUs = part.countOr("SIM_WRITE_STATUS_US", config.writeStatusUs);
     config.releaseUs = part.countOr("SIM_RELEASE_US", config.releaseUs);
 

@@ -114,6 +114,8 @@ void FlashModel::buildOpcodeTable() {
     set(config_.opFastRead, Command::FastRead, addressBytes);
     set(config_.opPageProgram, Command::PageProgram, addressBytes);
     set(config_.opSectorErase, Command::SectorErase, addressBytes, config_.sectorBytes);
+    set(config_.opBlockErase32, Command::SectorErase, addressBytes, 32 * 1024);
+    set(config_.opBlockErase64, Command::SectorErase, addressBytes, 64 * 1024);
     set(config_.opBulkErase, Command::BulkErase);
     set(config_.opDeepPowerDown, Command::DeepPowerDown);
     set(config_.opReleaseSignature, Command::ReleaseSignature);
@@ -363,7 +365,10 @@ void FlashModel::executeAtDeselect(bool onByteBoundary) {
         const std::uint32_t length = std::min(eraseBytes, config_.sizeBytes - base);
         std::fill_n(memory_.begin() + base, length, std::uint8_t{0xFF});
         persistMemory(base, length);
-        startBusy(config_.sectorEraseUs);
+        ++eraseCounts_[eraseBytes];
+        startBusy(eraseBytes == config_.sectorBytes ? config_.sectorEraseUs
+                  : eraseBytes <= 32 * 1024         ? config_.block32EraseUs
+                                                    : config_.block64EraseUs);
         return;
     }
     case Command::BulkErase:
@@ -371,6 +376,7 @@ void FlashModel::executeAtDeselect(bool onByteBoundary) {
         if (protectedArray()) break;
         std::fill(memory_.begin(), memory_.end(), std::uint8_t{0xFF});
         persistMemory(0, config_.sizeBytes);
+        ++eraseCounts_[config_.sizeBytes];
         startBusy(config_.bulkEraseUs);
         return;
     case Command::WriteStatus: {
@@ -488,6 +494,11 @@ void FlashModel::setStatus(std::uint8_t status1, std::uint8_t status2) {
 bool FlashModel::movesPageData(std::uint8_t opcode) const {
     const Command command = opcodes_[opcode].command;
     return command == Command::PageProgram || command == Command::Read || command == Command::FastRead;
+}
+
+std::uint64_t FlashModel::erasesOf(std::uint32_t bytes) const {
+    const auto it = eraseCounts_.find(bytes);
+    return it == eraseCounts_.end() ? 0 : it->second;
 }
 
 }  // namespace vorant::sim

@@ -10,6 +10,7 @@
 #include "ports/sim/FaultPlan.h"
 
 #include <array>
+#include <map>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
@@ -34,12 +35,14 @@ struct FlashConfig {
     int opReadStatus1 = 0x05, opReadStatus2 = -1, opWriteStatus = 0x01;
     int opRead = 0x03, opFastRead = 0x0B, opPageProgram = 0x02;
     int opSectorErase = 0x20, opBulkErase = 0xC7;
+    int opBlockErase32 = -1, opBlockErase64 = -1;  // 32 KiB and 64 KiB block erases
     int opDeepPowerDown = 0xB9, opReleaseSignature = 0xAB;
     std::uint32_t sectorBytes = 4096;
     QeLocation qe = QeLocation::None;
     bool writeStatusTakesTwoBytes = false;  // 01h accepts SR1 and SR2
     // Typical busy times in microseconds.
     std::uint32_t pageProgramUs = 700, bulkEraseUs = 40000, sectorEraseUs = 45;
+    std::uint32_t block32EraseUs = 120000, block64EraseUs = 150000;
     std::uint32_t writeStatusUs = 10000, releaseUs = 3;
 
     // Status register layout. Any block-protect bit set protects the whole
@@ -107,6 +110,9 @@ public:
     void setStatus(std::uint8_t status1, std::uint8_t status2);
 
     bool busy() const;
+    // Erases the chip carried out, by size in bytes (the whole chip counted
+    // under its size).
+    std::uint64_t erasesOf(std::uint32_t bytes) const;
     // true for the opcodes that write or read array data a page at a time
     // (page program, read, fast read, in either address width).
     bool movesPageData(std::uint8_t opcode) const;
@@ -162,6 +168,7 @@ private:
     std::uint8_t status2_ = 0;
 
     // Time in picoseconds, so any clock frequency adds up exactly enough.
+    std::map<std::uint32_t, std::uint64_t> eraseCounts_;
     std::uint64_t nowPs_ = 0;
     std::uint64_t bitPs_ = 0;
     std::uint32_t clockHz_ = kDefaultClockHz;

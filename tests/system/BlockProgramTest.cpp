@@ -1,0 +1,155 @@
+// Programming only what the image covers, on the simulated chip: data
+// around the image survive, a block that already holds the data is left
+// alone, the largest erases are used, and a failed erase writes no page.
+#include "host/ConstraintsManager.h"
+#include "tests/system/SystemRig.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+
+namespace vorant::test {
+namespace {
+
+constexpr std::uint32_t K = 1024;
+
+// W25Q16JV with its 4 KiB, 32 KiB and 64 KiB erases named.
+const char* const kBlocksPart = R"(
+[part.BLOCKS16]
+extends = "WINBOND_W25Q"
+JEDEC_ID = "EF4015"
+IDCODE = "EF4015"
+DEVICE_SIZE = 16777216
+WRSR_BITS = 8
+X4_READ = "FALSE"
+PROGRAM_WAITTIME = 400
+PROGRAM_WAITTIME_INC = 40
+PROGRAM_MAXWAITTIME = 4500
+BULKERASE_WAITTIME = 5000000
+BULKERASE_WAITTIME_INC = 500000
+BULKERASE_MAXWAITTIME = 37500000
+PROGRESS_ERASE_WAITTIME_INC = 325000
+SECTORERASE_WAITTIME = 45000
+SECTORERASE_MAXWAITTIME = 600000
+SECTORERASE_WAITTIME_INC = 5000
+BLOCKERASE32_INSTRUCTION = "01010010"
+BLOCKERASE32_SIZE = 32768
+BLOCKERASE32_WAITTIME = 120000
+BLOCKERASE32_MAXWAITTIME = 2400000
+BLOCKERASE32_WAITTIME_INC = 10000
+BLOCKERASE64_INSTRUCTION = "11011000"
+BLOCKERASE64_SIZE = 65536
+BLOCKERASE64_WAITTIME = 150000
+BLOCKERASE64_MAXWAITTIME = 3000000
+BLOCKERASE64_WAITTIME_INC = 10000
+)";
+
+using Bytes = std::vector<unsigned char>;
+
+struct BlockRig : SystemRig {
+    explicit BlockRig(sim::FaultPlan faults = {}) : SystemRig(loaded(), std::move(faults)) {}
+
+    static std::string loaded() {
+        loadShippedPartsOnce();
+        if (!ConstraintsManager::instance().hasPart("BLOCKS16"))
+            ConstraintsManager::instance().loadText(kBlocksPart, "blocks.toml");
+        return "BLOCKS16";
+    }
+    // Puts bytes straight into the chip, as an earlier job would have.
+    void fill(std::uint32_t address, const Bytes& bytes) {
+        std::copy(bytes.begin(), bytes.end(), port->model().memory().begin() + address);
+    }
+    void useRanges(std::vector<formats::ImageRange> ranges) {
+        image = std::make_unique<formats::FlashImage>(std::move(ranges));
+        device->setConfigData(image.get());
+    }
+    bool programBlocks(const std::vector<std::string>& switches = {"-v"}) {
+        return run([](Type1SPIDevice& d, UT_CMDARGS* args) { return d.programBlocks(0, args); }, switches);
+    }
+    const Bytes& flash() { return port->model().memory(); }
+    std::uint64_t erases(std::uint32_t bytes) { return port->model().erasesOf(bytes); }
+};
+
+TEST(BlockProgram, DataAroundTheImageSurviveAndOnlyTouchedBlocksAreErased) {
+    BlockRig rig;
+    const Bytes old = randomImage(0x30000, 1), boot = randomImage(0x1000, 2);
+    rig.fill(0, old);
+    rig.fill(0, boot);
+    const Bytes app = randomImage(3000, 3), patch = randomImage(0x100, 4);
+    // The app at 0x10000, and 256 bytes inside the block at 0x21000.
+    rig.useRanges({{0x10000, app}, {0x21100, patch}});
+    ASSERT_TRUE(rig.programBlocks()) << rig.messages.transcript();
+
+    Bytes expected = old;
+    std::copy(boot.begin(), boot.end(), expected.begin());
+    std::copy(app.begin(), app.end(), expected.begin() + 0x10000);
+    // The block at 0x10000 keeps what it held past the app.
+    std::copy(old.begin() + 0x10000 + 3000, old.begin() + 0x11000, expected.begin() + 0x10000 + 3000);
+    std::copy(patch.begin(), patch.end(), expected.begin() + 0x21100);
+    EXPECT_TRUE(std::equal(expected.begin(), expected.end(), rig.flash().begin()));
+    EXPECT_EQ(rig.erases(4 * K), 2u);
+    EXPECT_EQ(rig.erases(64 * K) + rig.erases(32 * K) + rig.erases(2 * 1024 * K), 0u);
+    EXPECT_NE(rig.messages.transcript().find("2 blocks erased"), std::string::npos);
+    EXPECT_NE(rig.messages.transcript().find("Verification completed."), std::string::npos);
+}
+
+TEST(BlockProgram, TheLargestErasesThatFitAndNoneForBlocksThatHoldTheData) {
+    BlockRig rig;
+    Bytes image = randomImage(1024 * K, 5);
+    rig.useRanges({{0, image}});
+    ASSERT_TRUE(rig.programBlocks()) << rig.messages.transcript();
+    EXPECT_EQ(rig.erases(64 * K), 16u);
+    EXPECT_EQ(rig.erases(4 * K) + rig.erases(32 * K), 0u);
+    EXPECT_TRUE(std::equal(image.begin(), image.end(), rig.flash().begin()));
+
+    // The same image again: nothing to erase or write. One 64 KiB block
+    // changed: that block alone.
+    ASSERT_TRUE(rig.programBlocks());
+    EXPECT_EQ(rig.erases(64 * K), 16u);
+    std::fill(image.begin() + 0x50000 + 10, image.begin() + 0x50000 + 20, 0x00);
+    rig.useRanges({{0, image}});
+    ASSERT_TRUE(rig.programBlocks());
+    EXPECT_EQ(rig.erases(64 * K), 17u);
+    EXPECT_TRUE(std::equal(image.begin(), image.end(), rig.flash().begin()));
+}
+
+TEST(BlockProgram, AnUnalignedImageUsesEverySize) {
+    BlockRig rig;
+    const Bytes image = randomImage(100 * K, 6);
+    rig.useRanges({{0x1000, image}});  // 0x1000..0x1A000
+    ASSERT_TRUE(rig.programBlocks()) << rig.messages.transcript();
+    // 4 KiB blocks up to 0x8000, 32 KiB blocks at 0x8000 and 0x10000 (a
+    // 64 KiB block at 0x10000 would reach past 0x1A000), 4 KiB blocks to
+    // the end.
+    EXPECT_EQ(rig.erases(32 * K), 2u);
+    EXPECT_EQ(rig.erases(64 * K), 0u);
+    EXPECT_EQ(rig.erases(4 * K), 7u + 2u);
+    EXPECT_TRUE(std::equal(image.begin(), image.end(), rig.flash().begin() + 0x1000));
+}
+
+TEST(BlockProgram, AFailedEraseWritesNoPageAndAStuckBitFailsTheVerify) {
+    {
+        sim::FaultPlan stuck;
+        stuck.stuckBusy = true;
+        BlockRig rig(stuck);
+        const Bytes old = randomImage(0x2000, 7);
+        rig.fill(0, old);
+        rig.useRanges({{0x100, randomImage(0x100, 8)}});
+        EXPECT_FALSE(rig.programBlocks());
+        EXPECT_NE(rig.messages.transcript().find("the erase of the block at address 0x0 did not complete; no page"),
+                  std::string::npos)
+            << rig.messages.transcript();
+    }
+    {
+        sim::FaultPlan stuck;
+        stuck.stuckBits = {{0x2345, 0xFF, 0x00}};
+        BlockRig rig(stuck);
+        rig.useRanges({{0x2000, randomImage(0x1000, 9)}});
+        EXPECT_FALSE(rig.programBlocks());
+        EXPECT_NE(rig.messages.transcript().find("Failed at address, 9029"), std::string::npos)
+            << rig.messages.transcript();
+    }
+}
+
+}  // namespace
+}  // namespace vorant::test
