@@ -197,8 +197,10 @@ bool Type1SPIDevice::programBlocks(int index, UT_CMDARGS* args) {
         DEVICE_MESSAGE().issueStatus("'%d': Programming cancelled.\n", index);
         result = false;
     } else {
-        DEVICE_MESSAGE().issueStatus("'%d': %d blocks erased, %d pages written, %d blocks already held the data.\n",
-                                     index, erased, pagesWritten, unchanged);
+        auto plural = [](int count, const char* one, const char* many) { return count == 1 ? one : many; };
+        DEVICE_MESSAGE().issueStatus("'%d': %d %s erased, %d %s written, %d %s the data already.\n", index, erased,
+                                     plural(erased, "block", "blocks"), pagesWritten, plural(pagesWritten, "page", "pages"),
+                                     unchanged, plural(unchanged, "block held", "blocks held"));
         if (verifyAfter) DEVICE_MESSAGE().issueStatus("'%d': Verification completed.\n", index);
     }
     return finishProgramming(index, args, result);

@@ -198,6 +198,45 @@ TEST_P(Memory, Program) {
     for (const Row& row : rows) check(row, [](auto& d, auto* args) { return int(d.program(0, args)); });
 }
 
+// Block programming in file mode: nothing can be read, so every block the
+// data touch is erased (with its longest wait) and only the pages holding
+// data are written; "-v" records reads that compare with what each block
+// should hold. The tiny part gets 16-byte sectors and 32-byte blocks.
+TEST_P(Memory, ProgramBlocks) {
+    const Properties blocks = {{"SECTOR_SIZE", "16"}, {"SECTORERASE_MAXWAITTIME", "600"},
+                               {"BLOCKERASE32_INSTRUCTION", "01010010"}, {"BLOCKERASE32_SIZE", "32"},
+                               {"BLOCKERASE32_WAITTIME", "120"}, {"BLOCKERASE32_MAXWAITTIME", "2400"}};
+    const Lines erase32 = concat({writeEnable(), {loading("block erase"), "shift 0 01010010" + std::string(24, '0'),
+                                                  "wait 2400"}});
+    const Lines written = concat({erase32, page(0), page(1), page(2, kFilePage, 4)});
+    Lines verified = written;
+    for (std::size_t p = 0; p < 4; ++p) {
+        Bytes expected = p < 2 ? patternBytes(8, 8 * p) : p == 2 ? patternBytes(4, 16) : Bytes{};
+        expected.resize(8, 0xFF);
+        const Lines read = pageRead("read", 8 * p, wireBytes(expected));
+        verified.insert(verified.end(), read.begin(), read.end() - 1);  // no cancel query between reads
+    }
+    const std::string start = "'0': Programming Flash.\n", x1 = "'0':Programming in x1 mode.\n";
+    auto run = [](auto& d, auto* args) { return int(d.programBlocks(0, args)); };
+    const Row rows[] = {
+        {.name = "20 bytes: one 32-byte block, three pages", .run = run, .stream = concat({written, writeDisable()}),
+         .script = kFile, .changes = blocks,
+         .status = {start, "'0': 1 block erased, 3 pages written, 0 blocks held the data already.\n", x1},
+         .dataBytes = 20},
+        {.name = "-v records reads that compare", .run = run, .stream = concat({verified, writeDisable()}),
+         .script = kFile, .changes = blocks,
+         .status = {start, "'0': 1 block erased, 3 pages written, 0 blocks held the data already.\n",
+                    "'0': Verification completed.\n", x1},
+         .tokens = {"-v"}, .dataBytes = 20},
+        {.name = "no erase smaller than the chip", .run = run, .result = 0, .stream = kNoScan, .script = kFile,
+         .changes = {{"SECTOR_SIZE", kAbsent}},
+         .errors = {"'0': Programming terminated, the part names no erase smaller than the chip "
+                    "(SECTORERASE_INSTRUCTION and SECTOR_SIZE); erase the whole chip instead.\n"},
+         .dataBytes = 20},
+    };
+    for (const Row& row : rows) check(row);
+}
+
 // Verify reads the data's range page by page from address 0 and stops at
 // the first page that differs; checksum reads it all and hands both sides to
 // the checksum accumulator.
