@@ -1,9 +1,10 @@
 #include "cli/CommandLine.h"
 
-#include "cli/SimFaultOption.h"
 #include "cli/UsageError.h"
 #include "cli/WholeNumberOption.h"
 #include "host/UT_STR.h"
+#include "ports/PortError.h"
+#include "ports/PortTable.h"
 
 #include <CLI/CLI.hpp>
 
@@ -25,13 +26,8 @@ std::string operationsHelp() {
     text << "Operations:\n";
     for (const OperationInfo& info : operationCatalog())
         text << "  " << info.synopsis << "\n      " << info.purpose << "\n";
-    text << "\nPorts (--port):\n"
-            "  sim          a simulated chip, erased at every start (the default)\n"
-            "  sim:FILE     a simulated chip whose memory and status registers live in FILE\n"
-            "  svf:FILE     record the scans as SVF into FILE; the file appears only when the\n"
-            "               operation succeeds (a failed or cancelled run leaves no file and\n"
-            "               leaves an existing FILE untouched)\n"
-            "\nReadback files (readback -f FILE):\n"
+    text << "\nPorts (--port KIND[:PATH][,KEY=VALUE...]):\n" << ports::portHelp()
+         <<             "\nReadback files (readback -f FILE):\n"
             "  FILE appears only when the readback succeeds: a failed or cancelled readback\n"
             "  leaves no file and leaves an existing FILE untouched. Through a symbolic link\n"
             "  the file it points to is replaced. A FIFO or a device is written as the data\n"
@@ -90,7 +86,7 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
                    "The flash part, or 'auto' to identify it by its JEDEC ID (default: auto; the SVF port "
                    "needs a name)")
         ->type_name("NAME|auto");
-    app.add_option("--port", values.port, "Where the scans go: sim, sim:FILE or svf:FILE (default: sim)")
+    app.add_option("--port", values.port, "Where the scans go: " + ports::portNames() + " (default: sim; see Ports)")
         ->type_name("PORT");
     app.add_option("--chip", values.chip,
                    "The part the simulator plays (default: --part, or " + std::string(kDefaultSimulatedChip) +
@@ -158,7 +154,11 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.part = values.part;
     if (options.part.empty()) throw UsageError("--part needs a part name or 'auto'");
     if (UT_STR::ICompare(options.part.c_str(), "auto") == 0) options.part = "auto";
-    options.port = parsePortChoice(values.port);
+    try {
+        options.port = ports::parsePortAddress(values.port);
+    } catch (const ports::PortError& error) {
+        throw UsageError(error.what());
+    }
     if (!values.chip.empty()) options.chip = values.chip;
     options.partFiles = values.partFiles;
     options.index = static_cast<int>(
@@ -176,8 +176,6 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.debug = values.debug;
     options.quiet = values.quiet;
     options.simFaults = values.simFaults;
-    // Checked now so a bad fault is a usage error before anything runs.
-    simFaultPlan(options.simFaults);
     return options;
 }
 

@@ -1,12 +1,13 @@
 #include "cli/SvfPlayback.h"
 
 #include "cli/RunSummary.h"
-#include "cli/SimFaultOption.h"
 #include "cli/Tool.h"
 #include "cli/ToolMessages.h"
 #include "cli/UsageError.h"
 #include "host/ConstraintsManager.h"
 #include "host/VorantException.h"
+#include "ports/PortTable.h"
+#include "ports/sim/FaultOption.h"
 #include "ports/sim/FlashModel.h"
 #include "ports/svf/SvfError.h"
 #include "ports/svf/SvfPlayer.h"
@@ -24,7 +25,8 @@ std::string simulatedChipName(const ToolOptions& options) {
 }
 
 int playRecording(const ToolOptions& options, const std::string& svfFile) {
-    if (!options.port.isSimulator())
+    const ports::PortInfo* port = ports::findPort(options.port.kind);
+    if (port == nullptr || !port->caps.simulatesChip)
         throw UsageError("'play' plays a file on the simulator; use --port sim or --port sim:FILE");
     std::error_code error;
     if (!std::filesystem::is_regular_file(svfFile, error))
@@ -42,12 +44,18 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
     }
     svf::SvfPlayerOptions playerOptions;
     if (options.clockHz) playerOptions.spiClockHz = *options.clockHz;
-    const std::string& backingFile = options.port.file;
+    sim::FaultPlan faults;
+    try {
+        faults = sim::faultPlan(options.simFaults);
+    } catch (const sim::FaultOptionError& problem) {
+        throw UsageError(problem.what());
+    }
+    const std::string& backingFile = options.port.path;
     const bool backingFileExisted = !backingFile.empty() && std::filesystem::exists(backingFile, error);
     const auto started = std::chrono::steady_clock::now();
     svf::SvfPlayResult result;
     try {
-        sim::FlashModel flash(config, simFaultPlan(options.simFaults), backingFile);
+        sim::FlashModel flash(config, faults, backingFile);
         svf::SvfPlayer player(flash, playerOptions);
         // The player checks the whole file before it plays the first
         // statement, so a malformed file leaves the flash as it was.

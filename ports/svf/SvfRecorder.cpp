@@ -110,7 +110,7 @@ void SvfRecorder::comment(const char* text) {
 }
 
 void SvfRecorder::writeCommentLines(const char* text) {
-    std::string& out = open_ ? heldComments_ : buffer_;
+    std::string& out = framer_.transactionOpen() ? heldComments_ : buffer_;
     // Every line of the text becomes a comment line of its own, so a text
     // with line breaks can never turn into statements.
     std::string_view rest(text);
@@ -128,28 +128,11 @@ void SvfRecorder::writeCommentLines(const char* text) {
 }
 
 bool SvfRecorder::shift(int stage, RLBitVec* tdi, RLBitVec* /*tdiMask*/, RLBitVec* tdo, RLBitVec* tdoMask) {
-    if (!usable() || tdi == nullptr) return false;
-    switch (stage) {
-    case ScanStage::kWhole:
-        closeTransaction();
-        addShift(*tdi, tdo, tdoMask);
-        closeTransaction();
-        break;
-    case ScanStage::kOpen:
-        closeTransaction();
-        addShift(*tdi, tdo, tdoMask);
-        break;
-    case ScanStage::kContinue:
-        if (!open_) return false;  // nothing selected the chip: as the simulator, refuse
-        addShift(*tdi, tdo, tdoMask);
-        break;
-    case ScanStage::kClose:
-    case ScanStage::kCaptureClose:
-        if (!open_) return false;
-        addShift(*tdi, tdo, tdoMask);
-        closeTransaction();
-        break;
-    default:
+    if (!usable()) return false;
+    // A refused shift records nothing, as the simulator refuses it.
+    const ports::FramingFault fault = framer_.shift(stage, tdi, tdo, tdoMask);
+    if (fault != ports::FramingFault::None) {
+        refusal_ = "SVF recorder: " + ports::describeFramingFault(fault, stage);
         return false;
     }
     flushIfFull();
@@ -164,8 +147,11 @@ bool SvfRecorder::wait(int time, bool /*microseconds: always true*/) {
     if (!usable()) return false;
     // The wait comes after the deselect: a status write only starts when
     // chip select rises.
-    closeTransaction();
-    if (time < 0) return false;
+    framer_.closeOpenTransaction();
+    if (time < 0) {
+        refusal_ = "SVF recorder: wait of a negative time (" + std::to_string(time) + " us)";
+        return false;
+    }
     if (time > 0) {
         buffer_ += "RUNTEST ";
         buffer_ += formatSvfSeconds(static_cast<std::uint64_t>(time));
@@ -180,15 +166,17 @@ bool SvfRecorder::wait(int time, bool /*microseconds: always true*/) {
 bool SvfRecorder::isCancelled(int /*level*/) { return cancelRequested_.load() || file_.failed(); }
 
 const char* SvfRecorder::failureReason() {
-    if (!file_.failed()) return nullptr;
+    if (!file_.failed()) return refusal_.empty() ? nullptr : refusal_.c_str();
     failureReason_ = file_.target().string() + " could not be written (is the disk full?)";
     return failureReason_.c_str();
 }
 
-void SvfRecorder::addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBitVec* tdoMask) {
+void SvfRecorder::select() {}
+
+// The recorder captures nothing: tdo always holds the bits expected.
+void SvfRecorder::shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec* tdoMask, bool /*capture*/) {
     const std::size_t bits = tdi.length();
     const std::size_t before = tdi_.size();
-    open_ = true;
     tdi_.append(tdi.data(), bits);
     const bool masked = tdoMask != nullptr && anyBitSet(tdoMask->data(), std::min(bits, tdoMask->length()));
     if (masked && !compares_) {
@@ -206,10 +194,8 @@ void SvfRecorder::addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBit
     }
 }
 
-void SvfRecorder::closeTransaction() {
-    if (!open_) return;
+void SvfRecorder::deselect() {
     if (!tdi_.empty()) writeSdr();
-    open_ = false;
     compares_ = false;
     tdi_.clear();
     tdo_.clear();
@@ -248,7 +234,7 @@ void SvfRecorder::flushBuffer() {
 
 void SvfRecorder::finish() {
     if (finished_) throw SvfError("'" + target().string() + "' is already finished");
-    closeTransaction();
+    framer_.closeOpenTransaction();
     flushBuffer();
     finished_ = true;
     std::string error;

@@ -13,6 +13,7 @@
 #include "host/ScanPort.h"
 #include "host/AtomicOutputFile.h"
 #include "ports/svf/BitBuffer.h"
+#include "ports/wire/TransactionFramer.h"
 
 #include <atomic>
 #include <cstdint>
@@ -42,7 +43,7 @@ struct SvfRecorderTotals {
     std::uint64_t commentCount = 0;
 };
 
-class SvfRecorder final : public ScanPort {
+class SvfRecorder final : public ScanPort, private ports::TransactionSink {
 public:
     // Opens the temporary file and writes the header. Throws SvfError naming
     // the file when it cannot be written; nothing is created then.
@@ -93,8 +94,10 @@ public:
 private:
     bool usable() const { return !finished_ && !file_.failed(); }
     void writeHeader(const SvfRecorderOptions& options);
-    void addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBitVec* tdoMask);
-    void closeTransaction();
+    // --- ports::TransactionSink: a transaction is joined into one SDR ---
+    void select() override;
+    void shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec* tdoMask, bool capture) override;
+    void deselect() override;
     void writeSdr();
     void writeCommentLines(const char* text);
     void flushIfFull();
@@ -102,9 +105,9 @@ private:
 
     vorant::AtomicOutputFile file_;
     std::string buffer_;
+    ports::TransactionFramer framer_{*this};
     // The transaction being joined. tdo_ and mask_ are only kept once a
     // shift of it has a mask bit set (compares_).
-    bool open_ = false;
     bool compares_ = false;
     BitBuffer tdi_, tdo_, mask_;
     // Comments that arrive while a transaction is open follow its SDR.
@@ -113,6 +116,7 @@ private:
     bool finished_ = false;
     SvfRecorderTotals totals_;
     std::string failureReason_;
+    std::string refusal_;  // why the last refused shift or wait was refused
 };
 
 }  // namespace vorant::svf

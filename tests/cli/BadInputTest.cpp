@@ -90,6 +90,18 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"ProgramQebit", kSim + Args{"program", "image.bin", "-e", "-qebit"}, 2, "W25Q16JV" + kNoQe},
     BadCase{"EraseQebitOnAnIdentifiedChip", {"--chip", "MX25L3233F", "--port", "sim:new.bin", "erase", "-qebit"}, 2,
             "MX25L3233F" + kNoQe},
+    // The port table decides: an unknown port, a key the port does not take,
+    // options for a port that has no use for them.
+    BadCase{"UnknownPort", {"--port", "usb:0", "erase"}, 2, "unknown port 'usb'; the ports are sim, svf"},
+    BadCase{"UnknownPortKey", {"--port", "sim:flash.bin,speed=9", "erase"}, 2, "sim has no key 'speed'"},
+    BadCase{"PortKeyWithoutValue", {"--port", "sim:flash.bin,speed", "erase"}, 2, "'speed' is not KEY=VALUE"},
+    BadCase{"ClockOnARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "--clock", "1000", "erase"}, 2,
+            "--clock sets the simulator's clock and does not apply to --port svf"},
+    BadCase{"FaultOnARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "--sim-fault", "stuck-busy", "erase"},
+            2, "--sim-fault applies to the simulator only"},
+    BadCase{"MalformedFault", kSim + Args{"--sim-fault", "fail-shift=0", "erase"}, 2, "counts from 1"},
+    BadCase{"StatusFromARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "status"}, 2,
+            "reads nothing; run it on a port that reads the chip"},
     BadCase{"QeRecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "qe", "set"}, 2, "W25Q16JV" + kNoQe}),
     [](const auto& info) { return std::string(info.param.name); });
 
