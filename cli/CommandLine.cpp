@@ -11,6 +11,7 @@
 #include <algorithm>
 #include <cstdint>
 #include <limits>
+#include <map>
 #include <sstream>
 
 namespace vorant::cli {
@@ -77,6 +78,9 @@ struct ParsedValues {
     bool dataWidthGiven = false, clockGiven = false;
     bool debug = false, quiet = false, version = false;
     std::vector<std::string> simFaults;
+    // Every key of the port table's rows, also accepted as --KEY VALUE.
+    std::map<std::string, std::string> portKeys;
+    std::vector<std::string> portKeysGiven;
 };
 
 void defineOptions(CLI::App& app, ParsedValues& values) {
@@ -106,6 +110,15 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
         ->type_name("HZ");
     app.add_flag("--debug", values.debug, "Show debug traces");
     app.add_flag("--quiet", values.quiet, "Show only errors: no status lines, progress or summary");
+    // The ports' own keys: the tool knows them only from the port table.
+    for (const ports::PortInfo& row : ports::portTable()) {
+        for (const ports::PortKey& key : row.keys) {
+            if (values.portKeys.count(key.name)) continue;
+            app.add_option("--" + key.name, values.portKeys[key.name], key.purpose + " (as ," + key.name + "= in --port)")
+                ->type_name(key.valueName)
+                ->group("Port options (where the port takes them)");
+        }
+    }
     // For tests and demonstrations: faults the simulated chip injects.
     app.add_option("--sim-fault", values.simFaults, "")
         ->expected(1)
@@ -156,6 +169,15 @@ ToolOptions toolOptions(const ParsedValues& values) {
     if (UT_STR::ICompare(options.part.c_str(), "auto") == 0) options.part = "auto";
     try {
         options.port = ports::parsePortAddress(values.port);
+        const ports::PortInfo& row = *ports::findPort(options.port.kind);
+        for (const std::string& key : values.portKeysGiven) {
+            if (!row.takesKey(key))
+                throw UsageError("--" + key + " does not apply to --port " + row.name);
+            if (options.port.keys.count(key))
+                throw UsageError("--" + key + " and ," + key + "= in --port are both given; give one");
+            options.port.keys[key] = values.portKeys.at(key);
+        }
+        ports::checkPortAddress(options.port, row);
     } catch (const ports::PortError& error) {
         throw UsageError(error.what());
     }
@@ -206,6 +228,8 @@ CommandLine parseCommandLine(const std::vector<std::string>& arguments) {
     }
     values.dataWidthGiven = app.count("--data-width") > 0;
     values.clockGiven = app.count("--clock") > 0;
+    for (const auto& [key, value] : values.portKeys)
+        if (app.count("--" + key) > 0) values.portKeysGiven.push_back(key);
     if (values.version) {
         result.action = CommandLine::Action::ShowVersion;
         return result;

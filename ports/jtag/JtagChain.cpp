@@ -30,7 +30,7 @@ JtagChain parseJtagChain(const std::string& text, unsigned& bridgeIrLength) {
     bool seenBridge = false;
     std::size_t start = 0;
     while (start <= text.size()) {
-        const std::size_t end = std::min(text.find(',', start), text.size());
+        const std::size_t end = std::min(text.find_first_of(",:", start), text.size());
         const std::string item = text.substr(start, end - start);
         if (item.size() >= 2 && item.front() == '[' && item.back() == ']') {
             if (seenBridge) throw std::invalid_argument("two TAPs in brackets; bracket the bridge's TAP only");

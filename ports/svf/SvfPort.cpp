@@ -1,14 +1,35 @@
 #include "ports/svf/SvfPort.h"
 
 #include "ports/PortError.h"
+#include "ports/jtag/BridgeKeys.h"
 #include "ports/svf/SvfError.h"
 
 namespace vorant::svf {
 
-SvfPort::SvfPort(const std::string& file, const ports::PortContext& context) {
+namespace {
+
+// Without a bridge key the recording keeps the first format: the ideal
+// bridge, waits in seconds only.
+constexpr const char* kDefaultBridge = "direct";
+constexpr std::uint32_t kDefaultTckHz = 10'000'000;
+
+}  // namespace
+
+SvfPort::SvfPort(const ports::PortAddress& address, const ports::PortContext& context) {
     SvfRecorderOptions options;
     options.toolName = context.toolName;
     options.partName = context.partName;
+    options.bridgeSettings = ports::jtag::bridgeSettings(address, kDefaultBridge);
+    if (options.bridgeSettings.name != "direct")
+        options.bridge = ports::jtag::makeBridge(options.bridgeSettings);
+    if (address.keys.count("tck-hz")) {
+        const auto hz = ports::jtag::keyNumber(address, "tck-hz", 1'000'000'000);
+        if (hz == 0) throw ports::PortError(ports::PortError::Kind::BadRequest, "--port " + address.text + ": tck-hz=0; give 1 to 1000000000");
+        options.tckHz = static_cast<std::uint32_t>(hz);
+    } else if (options.bridge) {
+        options.tckHz = kDefaultTckHz;
+    }
+    const std::string& file = address.path;
     try {
         recorder_ = std::make_unique<SvfRecorder>(file, options);
     } catch (const SvfError& error) {
@@ -32,14 +53,17 @@ const ports::PortInfo& svfPortInfo() {
         info.name = "svf";
         info.synopsis = {
             {"svf:FILE", "record the scans as SVF into FILE; the file appears only when the operation succeeds "
-                         "(a failed or cancelled run leaves no file and leaves an existing FILE untouched)"},
+                         "(a failed or cancelled run leaves no file and leaves an existing FILE untouched). "
+                         "Without bridge= the SVF assumes an ideal bridge (direct)"},
         };
         info.path = ports::PathUse::Required;
         info.pathName = "FILE";
+        info.keys = ports::jtag::bridgeKeys();
+        info.keys.push_back({"tck-hz", "HZ", "the TCK frequency waits are counted in (default 10000000 with a bridge)"});
         info.caps = {.readsBack = false, .records = true, .simulatesChip = false, .hasBusClock = false,
                      .takesSimFaults = false};
         info.open = [](const ports::PortAddress& address, const ports::PortContext& context) -> std::unique_ptr<ports::Port> {
-            return std::make_unique<SvfPort>(address.path, context);
+            return std::make_unique<SvfPort>(address, context);
         };
         return info;
     }();

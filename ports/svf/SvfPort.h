@@ -15,7 +15,7 @@ class SvfPort final : public ports::Port {
 public:
     // Throws PortError (BadRequest) when the file cannot be written;
     // nothing is created then.
-    SvfPort(const std::string& file, const ports::PortContext& context);
+    SvfPort(const ports::PortAddress& address, const ports::PortContext& context);
 
     ScanPort& scan() override { return *recorder_; }
     // Throws PortError (Unavailable) when the file could not be completed.

@@ -84,7 +84,7 @@ void appendClipped(BitBuffer& out, const RLBitVec* vector, std::size_t bits) {
 }  // namespace
 
 SvfRecorder::SvfRecorder(std::filesystem::path target, SvfRecorderOptions options) try
-    : file_(checkedTarget(std::move(target), options)) {
+    : file_(checkedTarget(std::move(target), options)), bridge_(options.bridge), tckHz_(options.tckHz) {
     buffer_.reserve(kFlushThreshold + 64 * 1024);
     writeHeader(options);
     flushBuffer();
@@ -98,9 +98,52 @@ void SvfRecorder::writeHeader(const SvfRecorderOptions& options) {
     if (!options.toolName.empty()) buffer_ += "// SVF written by " + oneLine(options.toolName) + "\n";
     if (!options.partName.empty()) buffer_ += "// Part: " + oneLine(options.partName) + "\n";
     if (options.timestamp) buffer_ += "// Date: " + utcDate() + "\n";
-    buffer_ += "// One SDR per SPI transaction: chip select is asserted for the length of each SDR.\n";
+    if (bridge_ == nullptr)
+        buffer_ += "// One SDR per SPI transaction: chip select is asserted for the length of each SDR.\n";
+    else
+        buffer_ += "// One SDR per SPI transaction, framed for the " + bridge_->name() + " bridge.\n";
     buffer_ += kSetup;
+    if (bridge_ != nullptr) writeBridgeSelection(options);
     buffer_ += joinedPreamble(options.preamble);
+}
+
+namespace {
+
+// A scan of `bits` bits all set to `ones`, as an SVF TDI value; nothing
+// for none, as the set-up already cleared every header and trailer.
+std::string constantScan(const char* command, std::size_t bits, bool ones) {
+    if (bits == 0) return {};
+    std::string line = std::string(command) + " " + std::to_string(bits);
+    {
+        BitBuffer value;
+        value.assign(bits, ones);
+        line += " TDI (";
+        appendSvfHex(line, value.data(), bits, SvfRecorder::kDigitsPerLine);
+        line += ")";
+    }
+    return line + ";\n";
+}
+
+}  // namespace
+
+// The other TAPs of the chain sit in BYPASS (an all-ones instruction, one
+// bypass bit each); SVF's header is shifted first, so it covers the TAPs
+// between the bridge and TDO.
+void SvfRecorder::writeBridgeSelection(const SvfRecorderOptions& options) {
+    const ports::jtag::BridgeSettings& settings = options.bridgeSettings;
+    const ports::jtag::JtagChain& chain = settings.chain;
+    buffer_ += constantScan("HIR", chain.irBitsAfter(), true);
+    buffer_ += constantScan("TIR", chain.irBitsBefore(), true);
+    buffer_ += constantScan("HDR", chain.tapsAfter(), false);
+    buffer_ += constantScan("TDR", chain.tapsBefore(), false);
+    if (!bridge_->selectsInstruction()) return;
+    BitBuffer instruction;
+    instruction.assign(settings.irLength, false);
+    for (unsigned k = 0; k < settings.irLength && k < 64; ++k)
+        instruction.setBit(k, (settings.instruction >> k) & 1u);
+    buffer_ += "SIR " + std::to_string(settings.irLength) + " TDI (";
+    appendSvfHex(buffer_, instruction.data(), settings.irLength, kDigitsPerLine);
+    buffer_ += ");\n";
 }
 
 void SvfRecorder::comment(const char* text) {
@@ -152,13 +195,7 @@ bool SvfRecorder::wait(int time, bool /*microseconds: always true*/) {
         refusal_ = "SVF recorder: wait of a negative time (" + std::to_string(time) + " us)";
         return false;
     }
-    if (time > 0) {
-        buffer_ += "RUNTEST ";
-        buffer_ += formatSvfSeconds(static_cast<std::uint64_t>(time));
-        buffer_ += " SEC;\n";
-        ++totals_.runTestCount;
-        totals_.runTestMicroseconds += static_cast<std::uint64_t>(time);
-    }
+    if (time > 0) writeRunTest(static_cast<std::uint64_t>(time));
     flushIfFull();
     return usable();
 }
@@ -204,18 +241,57 @@ void SvfRecorder::deselect() {
     heldComments_.clear();
 }
 
+void SvfRecorder::writeRunTest(std::uint64_t microseconds) {
+    totals_.runTestMicroseconds += microseconds;
+    if (!tckHz_) {
+        buffer_ += "RUNTEST " + formatSvfSeconds(microseconds) + " SEC;\n";
+        ++totals_.runTestCount;
+        return;
+    }
+    // Whole cycles, rounded up: a wait may run long, never short.
+    const std::uint64_t hz = *tckHz_;
+    std::uint64_t cycles = (microseconds * hz + 999'999) / 1'000'000;
+    std::uint64_t secondsLeft = microseconds;
+    do {
+        const std::uint64_t part = std::min(cycles, kMaxRunTestCycles);
+        const std::uint64_t partUs = cycles <= kMaxRunTestCycles ? secondsLeft : part * 1'000'000 / hz;
+        buffer_ += "RUNTEST " + std::to_string(part) + " TCK " + formatSvfSeconds(partUs) + " SEC;\n";
+        ++totals_.runTestCount;
+        cycles -= part;
+        secondsLeft -= std::min(secondsLeft, partUs);
+    } while (cycles > 0);
+}
+
 void SvfRecorder::writeSdr() {
-    const std::size_t bits = tdi_.size();
+    const BitBuffer* tdi = &tdi_;
+    const BitBuffer* tdo = &tdo_;
+    const BitBuffer* mask = &mask_;
+    if (bridge_ != nullptr) {
+        // The bridge frames the MOSI bits; what is compared moves to where
+        // the bridge returns MISO.
+        bridge_->encode(tdi_, compares_, dr_);
+        tdi = &dr_;
+        if (compares_) {
+            const std::size_t offset = bridge_->misoOffset();
+            for (auto [from, to] : {std::pair{&tdo_, &drTdo_}, std::pair{&mask_, &drMask_}}) {
+                to->assign(dr_.size(), false);
+                ports::copyBits(to->data(), offset, from->data(), 0, std::min(from->size(), dr_.size() - offset));
+            }
+            tdo = &drTdo_;
+            mask = &drMask_;
+        }
+    }
+    const std::size_t bits = tdi->size();
     buffer_ += "SDR ";
     buffer_ += std::to_string(bits);
     buffer_ += " TDI (";
-    appendSvfHex(buffer_, tdi_.data(), bits, kDigitsPerLine);
+    appendSvfHex(buffer_, tdi->data(), bits, kDigitsPerLine);
     buffer_ += ')';
     if (compares_) {
         buffer_ += " TDO (";
-        appendSvfHex(buffer_, tdo_.data(), bits, kDigitsPerLine);
+        appendSvfHex(buffer_, tdo->data(), bits, kDigitsPerLine);
         buffer_ += ") MASK (";
-        appendSvfHex(buffer_, mask_.data(), bits, kDigitsPerLine);
+        appendSvfHex(buffer_, mask->data(), bits, kDigitsPerLine);
         buffer_ += ')';
     }
     buffer_ += ";\n";

@@ -12,12 +12,15 @@
 #include "host/RLBitVec.h"
 #include "host/ScanPort.h"
 #include "host/AtomicOutputFile.h"
+#include "ports/jtag/Bridge.h"
 #include "ports/svf/BitBuffer.h"
 #include "ports/wire/TransactionFramer.h"
 
 #include <atomic>
 #include <cstdint>
 #include <filesystem>
+#include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -33,6 +36,17 @@ struct SvfRecorderOptions {
     // Lines written as they are after the set-up statements, for example an
     // SIR that selects the user's SPI bridge.
     std::vector<std::string> preamble;
+    // The JTAG-to-SPI bridge the recording is for: its instruction is
+    // selected once after the set-up (with the other TAPs of the chain in
+    // BYPASS through HIR/TIR/HDR/TDR), and each transaction becomes its DR
+    // scan. Null: the ideal bridge of the first format (no SIR, TDO at the
+    // SPI bits).
+    std::shared_ptr<const ports::jtag::Bridge> bridge;
+    ports::jtag::BridgeSettings bridgeSettings;
+    // With a TCK frequency every wait states its TCK cycles as well as its
+    // seconds, so it holds on a board that counts clocks. A wait longer than
+    // 2^31 - 1 cycles is split, as players read the count into an int.
+    std::optional<std::uint32_t> tckHz;
 };
 
 struct SvfRecorderTotals {
@@ -90,6 +104,8 @@ public:
 
     // Hex digits per line of a wrapped value.
     static constexpr std::size_t kDigitsPerLine = 128;
+    // The most TCK cycles one RUNTEST states.
+    static constexpr std::uint64_t kMaxRunTestCycles = 0x7FFFFFFF;
 
 private:
     bool usable() const { return !finished_ && !file_.failed(); }
@@ -99,6 +115,8 @@ private:
     void shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec* tdoMask, bool capture) override;
     void deselect() override;
     void writeSdr();
+    void writeRunTest(std::uint64_t microseconds);
+    void writeBridgeSelection(const SvfRecorderOptions& options);
     void writeCommentLines(const char* text);
     void flushIfFull();
     void flushBuffer();
@@ -110,6 +128,9 @@ private:
     // shift of it has a mask bit set (compares_).
     bool compares_ = false;
     BitBuffer tdi_, tdo_, mask_;
+    std::shared_ptr<const ports::jtag::Bridge> bridge_;
+    std::optional<std::uint32_t> tckHz_;
+    BitBuffer dr_, drTdo_, drMask_;  // the DR scan of a transaction
     // Comments that arrive while a transaction is open follow its SDR.
     std::string heldComments_;
     std::atomic<bool> cancelRequested_{false};
