@@ -7,7 +7,7 @@
 #include "host/ConstraintsManager.h"
 #include "host/VorantException.h"
 #include "ports/PortTable.h"
-#include "ports/sim/FaultOption.h"
+#include "ports/PortError.h"
 #include "ports/sim/FlashModel.h"
 #include "ports/svf/SvfError.h"
 #include "ports/svf/SvfPlayer.h"
@@ -26,8 +26,8 @@ std::string simulatedChipName(const ToolOptions& options) {
 
 int playRecording(const ToolOptions& options, const std::string& svfFile) {
     const ports::PortInfo* port = ports::findPort(options.port.kind);
-    if (port == nullptr || !port->caps.simulatesChip)
-        throw UsageError("'play' plays a file on the simulator; use --port sim or --port sim:FILE");
+    if (port == nullptr || port->playSvf == nullptr)
+        throw UsageError("'play' plays a file on simulated hardware; use --port sim, sim:FILE or board:FILE");
     std::error_code error;
     if (!std::filesystem::is_regular_file(svfFile, error))
         throw UsageError(svfFile + ": no such SVF file; give the file a recording run wrote");
@@ -36,30 +36,20 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
     if (!ConstraintsManager::instance().hasPart(chip))
         throw UsageError("unknown part '" + chip + "'; 'vorant-spi parts' lists the known parts");
 
-    sim::FlashConfig config;
-    try {
-        config = sim::FlashConfig::fromPartDatabase(chip);
-    } catch (const VorantException& problem) {
-        throw UsageError(std::string(problem.what()) + "; choose another chip with --chip NAME");
-    }
-    svf::SvfPlayerOptions playerOptions;
-    if (options.clockHz) playerOptions.spiClockHz = *options.clockHz;
-    sim::FaultPlan faults;
-    try {
-        faults = sim::faultPlan(options.simFaults);
-    } catch (const sim::FaultOptionError& problem) {
-        throw UsageError(problem.what());
-    }
+    ports::PortContext context;
+    context.chipName = chip;
+    context.clockHz = options.clockHz;
+    context.simFaults = options.simFaults;
     const std::string& backingFile = options.port.path;
     const bool backingFileExisted = !backingFile.empty() && std::filesystem::exists(backingFile, error);
     const auto started = std::chrono::steady_clock::now();
     svf::SvfPlayResult result;
     try {
-        sim::FlashModel flash(config, faults, backingFile);
-        svf::SvfPlayer player(flash, playerOptions);
         // The player checks the whole file before it plays the first
         // statement, so a malformed file leaves the flash as it was.
-        result = player.playFile(svfFile);
+        result = port->playSvf(options.port, context, svfFile);
+    } catch (const ports::PortError& problem) {
+        throw UsageError(problem.what());
     } catch (const VorantException& problem) {
         throw UsageError(std::string(problem.what()) + "; use a flash file made for this chip, or a new file name");
     } catch (const svf::SvfError& problem) {

@@ -1,5 +1,7 @@
 #include "ports/PortTable.h"
 
+#include "ports/SimulatedPlayback.h"
+#include "ports/jtag/board/BoardPort.h"
 #include "ports/sim/SimPort.h"
 #include "ports/svf/SvfPort.h"
 
@@ -23,6 +25,13 @@ std::string wrapped(const std::string& text, std::size_t indent, std::size_t wid
     return out + line;
 }
 
+// The players need the SVF and board libraries, which the simulator's own
+// library sits below; the table joins them.
+PortInfo withPlayer(PortInfo row, decltype(PortInfo::playSvf) player) {
+    row.playSvf = player;
+    return row;
+}
+
 }  // namespace
 
 const std::vector<PortInfo>& portTable() {
@@ -30,8 +39,9 @@ const std::vector<PortInfo>& portTable() {
     // registered itself would be dropped by the linker when nothing else
     // in its file is used. Optional cables get an #if here.
     static const std::vector<PortInfo> table = {
-        sim::simPortInfo(),
+        withPlayer(sim::simPortInfo(), &playOnSimulator),
         svf::svfPortInfo(),
+        withPlayer(jtag::boardPortInfo(), &playOnBoard),
     };
     return table;
 }

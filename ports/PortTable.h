@@ -5,6 +5,7 @@
 
 #include "ports/Port.h"
 #include "ports/PortAddress.h"
+#include "ports/svf/SvfPlayer.h"
 
 #include <memory>
 #include <string>
@@ -31,6 +32,12 @@ struct PortInfo {
     // Opens the port; the address has been checked against this row.
     // Throws PortError; a refused open leaves nothing behind.
     std::unique_ptr<Port> (*open)(const PortAddress& address, const PortContext& context) = nullptr;
+    // Plays an SVF file on the port's simulated hardware (the flash file,
+    // chip and faults as open() would take them); null for a port with no
+    // simulated hardware. Throws PortError for a request it refuses, and
+    // what the SVF player throws for a file it cannot play.
+    svf::SvfPlayResult (*playSvf)(const PortAddress& address, const PortContext& context,
+                                  const std::string& svfFile) = nullptr;
 
     bool takesKey(const std::string& key) const {
         for (const PortKey& known : keys)

@@ -8,9 +8,9 @@ namespace vorant::svf {
 
 namespace {
 
-// Without a bridge key the recording keeps the first format: the ideal
-// bridge, waits in seconds only.
-constexpr const char* kDefaultBridge = "direct";
+// The bridge most JTAG boards carry; bridge=direct keeps the first format
+// (the ideal bridge, waits in seconds only).
+constexpr const char* kDefaultBridge = "jtagspi";
 constexpr std::uint32_t kDefaultTckHz = 10'000'000;
 
 }  // namespace
@@ -54,7 +54,7 @@ const ports::PortInfo& svfPortInfo() {
         info.synopsis = {
             {"svf:FILE", "record the scans as SVF into FILE; the file appears only when the operation succeeds "
                          "(a failed or cancelled run leaves no file and leaves an existing FILE untouched). "
-                         "Without bridge= the SVF assumes an ideal bridge (direct)"},
+                         "The scans are framed for bridge= (default jtagspi); bridge=direct assumes an ideal bridge"},
         };
         info.path = ports::PathUse::Required;
         info.pathName = "FILE";

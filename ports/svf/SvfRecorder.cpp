@@ -8,6 +8,7 @@
 #include "ports/svf/SvfSeconds.h"
 
 #include <algorithm>
+#include <cstdio>
 #include <ctime>
 #include <sstream>
 #include <utility>
@@ -66,6 +67,15 @@ std::filesystem::path checkedTarget(std::filesystem::path target, const SvfRecor
     return target;
 }
 
+// The bridge as port keys, so a player can set up the same board.
+std::string bridgeKeysText(const ports::jtag::BridgeSettings& settings) {
+    char instruction[24];
+    std::snprintf(instruction, sizeof instruction, "0x%llx", static_cast<unsigned long long>(settings.instruction));
+    std::string text = "bridge=" + settings.name + ",ir=" + instruction + ",irlen=" + std::to_string(settings.irLength);
+    if (settings.misoDelay) text += ",delay=" + std::to_string(*settings.misoDelay);
+    return text;
+}
+
 std::string utcDate() {
     const std::time_t now = std::time(nullptr);
     const std::tm* utc = std::gmtime(&now);
@@ -101,7 +111,8 @@ void SvfRecorder::writeHeader(const SvfRecorderOptions& options) {
     if (bridge_ == nullptr)
         buffer_ += "// One SDR per SPI transaction: chip select is asserted for the length of each SDR.\n";
     else
-        buffer_ += "// One SDR per SPI transaction, framed for the " + bridge_->name() + " bridge.\n";
+        buffer_ += "// One SDR per SPI transaction, framed for the " + bridge_->name() + " bridge.\n" +
+                   std::string(kBridgeLinePrefix) + bridgeKeysText(options.bridgeSettings) + "\n";
     buffer_ += kSetup;
     if (bridge_ != nullptr) writeBridgeSelection(options);
     buffer_ += joinedPreamble(options.preamble);

@@ -26,6 +26,10 @@
 
 namespace vorant::svf {
 
+// The header comment of a bridge recording that names its bridge as port
+// keys: "// Bridge: bridge=jtagspi,ir=0x2,irlen=6".
+inline constexpr const char* kBridgeLinePrefix = "// Bridge: ";
+
 struct SvfRecorderOptions {
     // Named in the header comments when not empty.
     std::string toolName;

@@ -49,6 +49,7 @@ protected:
         fs::create_directories(dir_);
         address_ = parsePortAddress(Instance::kAddress);
         address_.path = (dir_ / address_.path).string();
+        address_.text = address_.kind + ":" + address_.path;
         row_ = findPort(address_.kind);
         ASSERT_NE(row_, nullptr);
         port_ = open();
@@ -86,7 +87,16 @@ protected:
     std::unique_ptr<Port> port_;
 };
 
-using Instances = ::testing::Types<SimInstance, SvfInstance>;
+struct BoardJtagSpiInstance {
+    static constexpr const char* kAddress = "board:flash.bin";
+    static constexpr bool kReadsBack = true;
+};
+struct BoardShiftDrInstance {
+    static constexpr const char* kAddress = "board:flash.bin,bridge=shiftdr,delay=2";
+    static constexpr bool kReadsBack = true;
+};
+
+using Instances = ::testing::Types<SimInstance, SvfInstance, BoardJtagSpiInstance, BoardShiftDrInstance>;
 TYPED_TEST_SUITE(ScanPortConformance, Instances);
 
 TYPED_TEST(ScanPortConformance, StartsHealthyAndSaysWhatItIs) {
