@@ -33,38 +33,43 @@ void BoardModel::resetTap() {
     ir_ = settings_.idcodeInstruction & mask(settings_.irLength);
 }
 
-bool BoardModel::tdo() const {
+bool BoardModel::tdo() {
     if (state_ == TapState::ShiftIr) return irShift_ & 1u;
-    if (state_ == TapState::ShiftDr) return bridgeSelected() ? bridge_->tdo() : (drShift_ & 1u);
-    return true;
+    if (state_ != TapState::ShiftDr) return true;
+    if (!bridgeSelected()) return drShift_ & 1u;
+    if (bridge_->clocksBeforeTdo() && !bridgeClockedThisCycle_) {
+        bridge_->shiftClock(tdi_);
+        bridgeClockedThisCycle_ = true;
+    }
+    return bridge_->tdo();
 }
 
+// Adapters set TDI with TCK low (some with no edge at all after a state
+// move left TCK low), so only the rising edge samples it.
 void BoardModel::setPins(bool tck, bool tms, bool tdi) {
+    tdi_ = tdi;
     if (tck == tck_) return;
     tck_ = tck;
-    if (!tck) {
-        if (state_ == TapState::ShiftDr && bridgeSelected()) {
-            bridge_->shiftClock(tdi);
-            spiClockedThisCycle_ = true;
-        }
-        return;
-    }
-    risingEdge(tms, tdi);
+    if (tck) risingEdge(tms, tdi);
 }
 
 void BoardModel::risingEdge(bool tms, bool tdi) {
     ++cycles_;
-    // A cycle the bridge clocked has already cost the flash its period.
-    if (!spiClockedThisCycle_) {
+    const bool user = bridgeSelected();
+    if (state_ == TapState::ShiftDr && user && !bridgeClockedThisCycle_) {
+        bridge_->shiftClock(tdi);
+        bridgeClockedThisCycle_ = true;
+    }
+    // A cycle that clocked the flash has already cost it its period.
+    if (!bridgeClockedThisCycle_ || !flash_.selected()) {
         owedPs_ += tckPeriodPs_;
         if (owedPs_ >= 1000) {
             flash_.advance(owedPs_ / 1000);
             owedPs_ %= 1000;
         }
     }
-    spiClockedThisCycle_ = false;
+    bridgeClockedThisCycle_ = false;
 
-    const bool user = bridgeSelected();
     switch (state_) {
     case TapState::TestLogicReset: ir_ = settings_.idcodeInstruction & mask(settings_.irLength); break;
     case TapState::CaptureDr:

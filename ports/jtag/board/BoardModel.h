@@ -31,10 +31,10 @@ public:
     // std::invalid_argument for unusable settings.
     BoardModel(sim::FlashModel& flash, BoardSettings settings);
 
-    // The adapter's pins. A falling TCK edge in Shift-DR clocks the
-    // bridge; a rising edge moves the TAP.
+    // The adapter's pins. A rising TCK edge clocks the TAP (and the bridge
+    // in Shift-DR); TDO is what the adapter reads before that edge.
     void setPins(bool tck, bool tms, bool tdi);
-    bool tdo() const;
+    bool tdo();
     // TRST: the TAP goes to Test-Logic-Reset.
     void resetTap();
 
@@ -65,7 +65,8 @@ private:
     std::uint64_t ir_;
     std::uint64_t irShift_ = 0;
     std::uint64_t drShift_ = 0;  // IDCODE or BYPASS while they are selected
-    bool spiClockedThisCycle_ = false;
+    bool tdi_ = false;
+    bool bridgeClockedThisCycle_ = false;
     std::uint64_t cycles_ = 0;
     std::uint64_t owedPs_ = 0;  // TCK time not yet handed to the flash
 };

@@ -72,11 +72,13 @@ public:
 
 }  // namespace
 
-// The registers hold the last `delay` MISO bits; the one pushed out is on
-// TDO. With no register MISO goes straight through.
+// TDO is read before the next rising edge: a delay of one is the TDO
+// register itself, each further clock a register in front of it. With no
+// delay the clock happened during the read, and MISO is TDO at once.
 void BridgeGateware::pushMiso(bool miso) {
+    const std::size_t registers = delay_ == 0 ? 0 : delay_ - 1;
     pipeline_.push_back(miso);
-    if (pipeline_.size() > delay_) {
+    if (pipeline_.size() > registers) {
         tdo_ = pipeline_.front();
         pipeline_.pop_front();
     } else {

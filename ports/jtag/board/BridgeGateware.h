@@ -5,8 +5,11 @@
 // on the wire, apart from the host's encoders: a framing mistake on one
 // side then shows as a failed transfer instead of passing both ways.
 //
-// SPI clocks happen on the falling TCK edge in Shift-DR with the TDI the
-// next rising edge samples; MISO goes through `delay` registers to TDO.
+// A Shift-DR clock of the TAP is an SPI clock (MOSI = TDI) on its rising
+// edge, and TDO shows MISO from `delay` clocks before. With no delay MISO
+// reaches TDO within the same clock, before its rising edge: the board
+// then clocks the bridge as soon as TDO is read (and at the rising edge
+// when nobody reads it).
 
 #include "ports/sim/FlashModel.h"
 
@@ -23,13 +26,15 @@ public:
 
     // Capture-DR with the bridge's instruction.
     virtual void capture() = 0;
-    // A falling TCK edge in Shift-DR; tdi is what the next rising edge samples.
+    // One TCK in Shift-DR with this TDI.
     virtual void shiftClock(bool tdi) = 0;
     // The rising edge that leaves Shift-DR.
     virtual void leaveShift() = 0;
     // Update-DR.
     virtual void update() = 0;
     bool tdo() const { return tdo_; }
+    // MISO goes straight to TDO: the clock must happen when TDO is read.
+    bool clocksBeforeTdo() const { return delay_ == 0; }
 
 protected:
     // One SPI clock; TDO then shows MISO from `delay` clocks before.
@@ -44,6 +49,8 @@ private:
     void pushMiso(bool miso);
 
     unsigned delay_;
+    // MISO bits on their way to TDO: delay - 1 registers after the one
+    // that drives TDO.
     std::deque<bool> pipeline_;
     bool tdo_ = true;
 };
