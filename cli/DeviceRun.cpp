@@ -380,6 +380,16 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         toolError(std::string("the operation stopped: ") + error.what());
         result = false;
     }
+    // A live port may still hold writes it batched: they go out now, and a
+    // failure there fails the run.
+    if (!run.session->caps().records) {
+        try {
+            run.session->commit();
+        } catch (const ports::PortError& error) {
+            toolError(error.what());
+            result = false;
+        }
+    }
     // Every operation that stops early for a cancel returns false; one that
     // saw the cancel only after its last page (or after an erase that no
     // cancel can stop) finished its job, and its result stands.

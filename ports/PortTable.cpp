@@ -3,6 +3,9 @@
 #include "ports/SimulatedPlayback.h"
 #include "ports/jtag/board/BoardPort.h"
 #include "ports/sim/SimPort.h"
+#if VORANT_HAVE_OPENOCD
+#include "ports/openocd/OpenOcdPort.h"
+#endif
 #include "ports/svf/SvfPort.h"
 
 #include <sstream>
@@ -42,6 +45,9 @@ const std::vector<PortInfo>& portTable() {
         withPlayer(sim::simPortInfo(), &playOnSimulator),
         svf::svfPortInfo(),
         withPlayer(jtag::boardPortInfo(), &playOnBoard),
+#if VORANT_HAVE_OPENOCD
+        openocd::openOcdPortInfo(),
+#endif
     };
     return table;
 }

@@ -39,9 +39,14 @@ TEST(PortTable, EveryRowIsCompleteAndConsistent) {
 }
 
 TEST(PortTable, HelpShowsEveryFormAndKey) {
-    const std::string help = portHelp();
+    const std::string help = "\n" + portHelp();
     for (const PortInfo& row : portTable()) {
-        for (const auto& [form, purpose] : row.synopsis) EXPECT_NE(help.find("  " + form + " "), std::string::npos) << form;
+        for (const auto& [form, purpose] : row.synopsis) {
+            const std::size_t at = help.find("\n  " + form);
+            ASSERT_NE(at, std::string::npos) << form;
+            const char after = help[at + 3 + form.size()];
+            EXPECT_TRUE(after == ' ' || after == '\n') << form << " is a line of its own";
+        }
         for (const PortKey& key : row.keys) EXPECT_NE(help.find("," + key.name + "="), std::string::npos) << key.name;
         EXPECT_NE(portNames().find(row.name), std::string::npos);
     }
