@@ -75,7 +75,8 @@ TEST_P(BridgeRoundTrip, RecordedProgramPlaysOnABoardWithThatBridge) {
     const std::size_t tdo = text.rfind(" TDO (");
     const std::size_t digit = text.find_first_of("0123456789ABCDEF", tdo + 6 + 8);
     text[digit] = text[digit] == '0' ? '1' : '0';
-    const std::size_t line = static_cast<std::size_t>(std::count(text.begin(), text.begin() + static_cast<long>(tdo), '\n')) + 1;
+    const std::size_t sdr = text.rfind("\nSDR ", tdo) + 1;  // a mismatch names the line its SDR starts on
+    const std::size_t line = static_cast<std::size_t>(std::count(text.begin(), text.begin() + static_cast<long>(sdr), '\n')) + 1;
     sim::FlashModel again(sim::FlashConfig::fromPartDatabase(part));
     const auto tampered = playOnFreshBoard(text, again);
     ASSERT_EQ(tampered.mismatches.size(), 1u);
