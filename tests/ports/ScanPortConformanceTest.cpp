@@ -7,6 +7,10 @@
 #include "host/ScanPort.h"
 #include "ports/Port.h"
 #include "ports/PortTable.h"
+#include "ports/jtag/board/BoardModel.h"
+#include "ports/openocd/OpenOcdPort.h"
+#include "ports/sim/FlashModel.h"
+#include "tests/doubles/FakeTclRpc.h"
 #include "tests/support/TestParts.h"
 
 #include <gtest/gtest.h>
@@ -28,7 +32,13 @@ const std::string& conformancePart() {
     return name;
 }
 
-// Each instance opens its port the way the tool does: through its row.
+// An instance that opens its port itself (over a double) instead of
+// through the table's row.
+template <class Instance>
+concept OpensItself = requires(const PortContext& context) { Instance::open(context); };
+
+// Each instance opens its port the way the tool does, through its row;
+// a cable's instance opens it over its double instead of the OS.
 struct SimInstance {
     static constexpr const char* kAddress = "sim:flash.bin";
     static constexpr bool kReadsBack = true;
@@ -63,7 +73,8 @@ protected:
         context.toolName = "conformance";
         context.partName = conformancePart();
         context.chipName = conformancePart();
-        return row_->open(address_, context);
+        if constexpr (OpensItself<Instance>) return Instance::open(context);
+        else return row_->open(address_, context);
     }
     ScanPort& scan() { return port_->scan(); }
     bool send(int stage, const std::string& bits) {
@@ -96,7 +107,33 @@ struct BoardShiftDrInstance {
     static constexpr bool kReadsBack = true;
 };
 
-using Instances = ::testing::Types<SimInstance, SvfInstance, BoardJtagSpiInstance, BoardShiftDrInstance>;
+// OpenOCD's Tcl server as the double gives it, a board behind it.
+class OpenOcdOverDouble final : public Port {
+public:
+    explicit OpenOcdOverDouble(const std::string& chip)
+        : flash_(sim::FlashConfig::fromPartDatabase(chip)), board_(flash_, jtag::BoardSettings{}) {
+        PortAddress address;
+        address.text = address.kind = "openocd";
+        port_ = std::make_unique<openocd::OpenOcdPort>(std::make_unique<vorant::test::FakeTclRpc>(board_), address,
+                                                       "OpenOCD double");
+    }
+    ScanPort& scan() override { return port_->scan(); }
+
+private:
+    sim::FlashModel flash_;
+    jtag::BoardModel board_;
+    std::unique_ptr<openocd::OpenOcdPort> port_;
+};
+struct OpenOcdInstance {
+    static constexpr const char* kAddress = "openocd";
+    static constexpr bool kReadsBack = true;
+    static std::unique_ptr<Port> open(const PortContext& context) {
+        return std::make_unique<OpenOcdOverDouble>(context.chipName);
+    }
+};
+
+using Instances =
+    ::testing::Types<SimInstance, SvfInstance, BoardJtagSpiInstance, BoardShiftDrInstance, OpenOcdInstance>;
 TYPED_TEST_SUITE(ScanPortConformance, Instances);
 
 TYPED_TEST(ScanPortConformance, StartsHealthyAndSaysWhatItIs) {
