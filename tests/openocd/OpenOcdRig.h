@@ -15,6 +15,7 @@ using cli::test::Args;
 using cli::test::operator+;
 using cli::test::Child;
 using cli::test::Result;
+using cli::test::has;
 namespace fs = std::filesystem;
 
 // A program started by path, its output in files; ended by pid.

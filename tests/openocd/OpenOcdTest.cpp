@@ -7,7 +7,6 @@
 namespace vorant::openocd::test {
 namespace {
 
-using cli::test::has;
 using cli::test::randomBytes;
 
 constexpr std::size_t kImageBytes = 200000;
@@ -108,6 +107,54 @@ TEST_F(OpenOcdRig, NamesWhyTheCableFailed) {
     EXPECT_EQ(vanished.status, 1) << vanished.text();
     EXPECT_FALSE(has(vanished.err, "succeeded")) << vanished.text();
     EXPECT_TRUE(has(vanished.err, "OpenOCD")) << vanished.text();
+}
+
+}  // namespace
+}  // namespace vorant::openocd::test
+
+namespace vorant::openocd::test {
+namespace {
+
+// The board refuses a stream that is not remote_bitbang: a message, the
+// connection closed, and the board still serving the next adapter. No
+// OpenOCD needed.
+class BoardServer : public cli::test::ToolTest {};
+
+std::string exchange(int port, const std::string& bytes) {
+    const int fd = socket(AF_INET, SOCK_STREAM, 0);
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(static_cast<std::uint16_t>(port));
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    if (connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0) {
+        close(fd);
+        return "no connection";
+    }
+    timeval limit{5, 0};
+    setsockopt(fd, SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
+    send(fd, bytes.data(), bytes.size(), MSG_NOSIGNAL);
+    std::string reply;
+    char buffer[256];
+    for (ssize_t n; (n = recv(fd, buffer, sizeof buffer, 0)) > 0;) reply.append(buffer, static_cast<std::size_t>(n));
+    close(fd);
+    return reply;  // complete once the board closed the connection
+}
+
+TEST_F(BoardServer, RefusesMalformedInputAndServesTheNextAdapter) {
+    Process board((binDir() / "vorant-board").string(), Args{"--part", "W25Q16JV"}, dir, root / "board.log");
+    ASSERT_TRUE(Child::until([&] { return board.log().find('\n') != std::string::npos; }, std::chrono::seconds(10)));
+    const std::string log = board.log();
+    const int port = std::stoi(log.substr(log.rfind(':', log.find('\n')) + 1));
+
+    EXPECT_EQ(exchange(port, "0R4R\x01" "0R"), "11") << "the answers before the bad byte, then the end";
+    ASSERT_TRUE(Child::until([&] { return board.log().find("unexpected byte 0x01") != std::string::npos; },
+                             std::chrono::seconds(5)))
+        << board.log();
+    EXPECT_TRUE(has(board.log(), "vorant-board: unexpected byte 0x01 at byte 5 of the remote_bitbang stream; "
+                                 "closing the connection"))
+        << board.log();
+    EXPECT_TRUE(board.running());
+    EXPECT_EQ(exchange(port, "0RQ"), "1") << "a new adapter is served";
 }
 
 }  // namespace
