@@ -44,6 +44,21 @@ std::string chooseTap(OpenOcdSink& sink, const PortAddress& address, const std::
                 "); give one of them with --tap");
 }
 
+// The IR length OpenOCD declares for `tap` (its scan_chain table); 0 when
+// the table says nothing readable about it.
+unsigned declaredIrLength(OpenOcdSink& sink, const std::string& tap) {
+    std::string table;
+    if (!sink.run("scan_chain", table)) return 0;
+    std::istringstream lines(table);
+    for (std::string line; std::getline(lines, line);) {
+        const std::vector<std::string> columns = words(line);
+        // " 0 fpga.tap  Y  0x0362d093 0x0362d093  6 0x01 0x03"
+        if (columns.size() >= 6 && columns[1] == tap && columns[5].find_first_not_of("0123456789") == std::string::npos)
+            return static_cast<unsigned>(std::stoul(columns[5]));
+    }
+    return 0;
+}
+
 std::unique_ptr<Port> open(const PortAddress& address, const PortContext&) {
     std::string host = kDefaultHost;
     std::uint16_t port = kDefaultTclPort;
@@ -79,6 +94,13 @@ OpenOcdPort::OpenOcdPort(std::unique_ptr<TclRpcIo> io, const PortAddress& addres
     sink_ = std::make_unique<OpenOcdSink>(*io_, "");
     const std::string tap = chooseTap(*sink_, address, where);
     sink_ = std::make_unique<OpenOcdSink>(*io_, tap);
+    // OpenOCD shifts as many IR bits as the TAP was declared with: a
+    // bridge instruction of another length would land wrong.
+    const unsigned declared = declaredIrLength(*sink_, tap);
+    if (declared != 0 && declared != bridge.irLength)
+        unavailable(where + ": OpenOCD declares " + tap + " with a " + std::to_string(declared) +
+                    "-bit IR, but the bridge's instruction has " + std::to_string(bridge.irLength) +
+                    " bits; give the TAP's real length to 'jtag newtap ... -irlen' and to --irlen");
     port_ = std::make_unique<jtag::JtagPort>(where + ", TAP " + tap, jtag::makeBridge(bridge), bridge, *sink_);
 }
 

@@ -61,6 +61,13 @@ bool FakeTclRpc::execute(const std::string& command, std::string& result) {
         result = tap_;
         return true;
     }
+    if (w[0] == "scan_chain" && w.size() == 1) {
+        result = "   TapName             Enabled  IdCode     Expected   IrLen IrCap IrMask\n"
+                 "-- ------------------- -------- ---------- ---------- ----- ----- ------\n"
+                 " 0 " + tap_ + "               Y     0x0362d093 0x0362d093     " +
+                 std::to_string(board_.settings().irLength) + " 0x01  0x03\n";
+        return true;
+    }
     if ((w[0] == "irscan" || w[0] == "drscan") && (w.size() < 2 || w[1] != tap_)) {
         result = "Tap '" + (w.size() > 1 ? w[1] : std::string()) + "' could not be found";
         return false;

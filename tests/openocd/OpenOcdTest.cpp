@@ -109,6 +109,17 @@ TEST_F(OpenOcdRig, NamesWhyTheCableFailed) {
     EXPECT_TRUE(has(vanished.err, "OpenOCD")) << vanished.text();
 }
 
+// OpenOCD declares the TAP with a 5-bit IR; the board's has 6.
+TEST_F(OpenOcdRig, RefusesATapDeclaredWithAnotherIrLength) {
+    startBoard();
+    startOpenOcd({}, true, 5);
+    const Result wrongIr = run(viaOpenOcd({"idcode"}));
+    EXPECT_EQ(wrongIr.status, 1) << wrongIr.text();
+    EXPECT_TRUE(has(wrongIr.err, "OpenOCD declares fpga.tap with a 5-bit IR, but the bridge's instruction has 6 bits"))
+        << wrongIr.text();
+    EXPECT_EQ(files(), Args{"flash.bin"}) << "nothing but the board's flash file";
+}
+
 }  // namespace
 }  // namespace vorant::openocd::test
 

@@ -49,7 +49,8 @@ struct Rig {
         PortAddress address;
         address.text = "openocd" + keys;
         address.kind = "openocd";
-        if (!keys.empty()) address.keys = {{"tap", keys.substr(5)}};
+        const std::size_t equals = keys.find('=');
+        if (!keys.empty()) address.keys = {{keys.substr(1, equals - 1), keys.substr(equals + 1)}};
         port = std::make_unique<OpenOcdPort>(std::move(io), address, "OpenOCD at test");
     }
     ScanPort& scan() { return port->scan(); }
@@ -64,8 +65,9 @@ struct Rig {
 
 TEST(OpenOcdPort, APageCostsOneRoundTripBeyondItsPolls) {
     Rig rig;
-    ASSERT_EQ(rig.rpc->log.size(), 1u);
+    ASSERT_EQ(rig.rpc->log.size(), 2u);
     EXPECT_EQ(rig.rpc->log[0], "list [catch {jtag names} r] $r");
+    EXPECT_EQ(rig.rpc->log[1], "list [catch {scan_chain} r] $r");
     for (int page = 0; page < 3; ++page) {
         const std::size_t before = rig.rpc->log.size();
         RLBitVec wren = wire({0x06}), program = wire({0x02, 0x00, static_cast<std::uint8_t>(page), 0x00, 0xA5});
@@ -78,9 +80,9 @@ TEST(OpenOcdPort, APageCostsOneRoundTripBeyondItsPolls) {
     }
     // The first request selects the bridge, then the page's scans, its
     // sleep (in whole milliseconds) and the status read.
-    EXPECT_EQ(rig.rpc->log[1].rfind("list [catch {irscan fpga.tap 0x2; drscan fpga.tap 41 0x", 0), 0u) << rig.rpc->log[1];
-    EXPECT_NE(rig.rpc->log[1].find("; sleep 1; drscan fpga.tap 50 0x"), std::string::npos) << rig.rpc->log[1];
-    EXPECT_EQ(rig.rpc->log[2].find("irscan"), std::string::npos) << "the instruction stays selected";
+    EXPECT_EQ(rig.rpc->log[2].rfind("list [catch {irscan fpga.tap 0x2; drscan fpga.tap 41 0x", 0), 0u) << rig.rpc->log[2];
+    EXPECT_NE(rig.rpc->log[2].find("; sleep 1; drscan fpga.tap 50 0x"), std::string::npos) << rig.rpc->log[2];
+    EXPECT_EQ(rig.rpc->log[3].find("irscan"), std::string::npos) << "the instruction stays selected";
     EXPECT_EQ(rig.flash.memory()[0x200], 0xA5);
 }
 
@@ -94,7 +96,7 @@ TEST(OpenOcdPort, ABadReplyIsAnErrorNeverData) {
     };
     for (const auto& [reply, reason] : replies) {
         Rig rig;
-        rig.rpc->garbleAtRequest = 2;
+        rig.rpc->garbleAtRequest = 3;
         rig.rpc->garbledReply = reply;
         EXPECT_EQ(rig.status(), "failed") << reply;
         const char* why = rig.scan().failureReason();
@@ -109,11 +111,24 @@ TEST(OpenOcdPort, ABadReplyIsAnErrorNeverData) {
 
 TEST(OpenOcdPort, ALostConnectionIsALostCable) {
     Rig rig;
-    rig.rpc->closeAtRequest = 2;
+    rig.rpc->closeAtRequest = 3;
     EXPECT_EQ(rig.status(), "failed");
     EXPECT_TRUE(rig.scan().connectionLost());
     EXPECT_TRUE(rig.scan().isCancelled(2)) << "nothing is worth polling on a lost cable";
     EXPECT_NE(std::string(rig.scan().failureReason()).find("OpenOCD closed the connection"), std::string::npos);
+}
+
+TEST(OpenOcdPort, RefusesABridgeInstructionOfAnotherIrLength) {
+    try {
+        Rig rig(",irlen=8");
+        ADD_FAILURE() << "an 8-bit instruction on a 6-bit IR was accepted";
+    } catch (const PortError& error) {
+        EXPECT_EQ(error.kind(), PortError::Kind::Unavailable);
+        EXPECT_NE(std::string(error.what()).find("OpenOCD declares fpga.tap with a 6-bit IR, but the bridge's "
+                                                 "instruction has 8 bits"),
+                  std::string::npos)
+            << error.what();
+    }
 }
 
 TEST(OpenOcdPort, NamesTheTapsWhenTheOneAskedForIsMissing) {
