@@ -26,8 +26,13 @@ std::string simulatedChipName(const ToolOptions& options) {
 
 int playRecording(const ToolOptions& options, const std::string& svfFile) {
     const ports::PortInfo* port = ports::findPort(options.port.kind);
-    if (port == nullptr || port->playSvf == nullptr)
-        throw UsageError("'play' plays a file on simulated hardware; use --port sim, sim:FILE or board:FILE");
+    if (port == nullptr || port->playSvf == nullptr) {
+        std::string players;
+        for (const ports::PortInfo& row : ports::portTable())
+            if (row.playSvf != nullptr) players += (players.empty() ? "--port " : " or --port ") + row.name;
+        throw UsageError("'play' plays a file on simulated hardware, which --port " + options.port.kind +
+                         " has none of; use " + players);
+    }
     std::error_code error;
     if (!std::filesystem::is_regular_file(svfFile, error))
         throw UsageError(svfFile + ": no such SVF file; give the file a recording run wrote");

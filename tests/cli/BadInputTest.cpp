@@ -119,6 +119,8 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
             "--clock sets the simulator's clock and does not apply to --port openocd"},
     BadCase{"ChipOnOpenOcd", {"--port", "openocd", "--chip", "W25Q16JV", "idcode"}, 2,
             "--chip names the simulated chip and does not apply to --port openocd"},
+    BadCase{"PlayOnARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "play", "old.svf"}, 2,
+            "--port svf has none of; use --port sim or --port board"},
     BadCase{"StatusFromARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "status"}, 2,
             "reads nothing; run it on a port that reads the chip"},
     BadCase{"QeRecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "qe", "set"}, 2, "W25Q16JV" + kNoQe}),
