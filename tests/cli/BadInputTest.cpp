@@ -119,6 +119,8 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
             "--clock sets the simulator's clock and does not apply to --port openocd"},
     BadCase{"ChipOnOpenOcd", {"--port", "openocd", "--chip", "W25Q16JV", "idcode"}, 2,
             "--chip names the simulated chip and does not apply to --port openocd"},
+    BadCase{"PortFaultOnTheBoard", {"--port", "board:board.bin", "--sim-fault", "fail-shift=3", "erase"}, 2,
+            "the board takes the chip's faults only"},
     BadCase{"PlayOnARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "play", "old.svf"}, 2,
             "--port svf has none of; use --port sim or --port board"},
     BadCase{"StatusFromARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "status"}, 2,

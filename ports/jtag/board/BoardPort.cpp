@@ -45,6 +45,12 @@ BoardPort::BoardPort(const PortAddress& address, const PortContext& context) {
     } catch (const VorantException& error) {
         refuse(std::string(error.what()) + "; choose another chip with --chip NAME");
     }
+    // The board's chip takes its faults; the simulator port's own (failing
+    // calls, a lost cable, a cancel) have no place on a board.
+    if (faults.failShiftAt || faults.failAllShifts || faults.failWaitAt || faults.failAllWaits ||
+        faults.cancelAfterPages >= 0 || faults.failShiftAtPage || faults.failWaitAtPage || faults.disconnectAtShift)
+        refuse("--port " + address.text + ": the board takes the chip's faults only (stuck-busy, stuck-bit, "
+               "protected, deep-power-down, status-locked); the port's faults need --port sim");
     std::error_code error;
     const std::string& file = address.path;
     const bool fileExisted = !file.empty() && std::filesystem::exists(file, error);
