@@ -59,6 +59,11 @@ BridgeSettings bridgeSettings(const PortAddress& address, const std::string& def
         settings.instruction = keyNumber(address, "ir", limit);
     }
     if (address.keys.count("delay")) settings.misoDelay = static_cast<unsigned>(keyNumber(address, "delay", 64));
+    // Without a marker the other TAPs' bypass bits of a scan would be SPI
+    // clocks; only jtagspi finds its frame among them.
+    if (settings.chain.tapCount() > 1 && settings.name != "jtagspi")
+        refuse(address, "bridge=" + settings.name + " cannot share a chain with other TAPs (their bypass bits "
+                        "would be SPI clocks); use bridge=jtagspi");
     try {
         makeBridge(settings);
     } catch (const std::invalid_argument& error) {

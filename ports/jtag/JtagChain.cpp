@@ -45,4 +45,12 @@ JtagChain parseJtagChain(const std::string& text, unsigned& bridgeIrLength) {
     return chain;
 }
 
+std::string formatJtagChain(const JtagChain& chain, unsigned bridgeIrLength) {
+    std::string text;
+    for (unsigned length : chain.irLengthsBefore) text += std::to_string(length) + ":";
+    text += "[" + std::to_string(bridgeIrLength) + "]";
+    for (unsigned length : chain.irLengthsAfter) text += ":" + std::to_string(length);
+    return text;
+}
+
 }  // namespace vorant::ports::jtag

@@ -26,5 +26,8 @@ struct JtagChain {
 // std::invalid_argument with the reason; the bridge's own IR length is
 // returned through `bridgeIrLength`.
 JtagChain parseJtagChain(const std::string& text, unsigned& bridgeIrLength);
+// The chain written back with ':' between the TAPs ("8:[6]:4"), as it can
+// stand inside a --port address.
+std::string formatJtagChain(const JtagChain& chain, unsigned bridgeIrLength);
 
 }  // namespace vorant::ports::jtag

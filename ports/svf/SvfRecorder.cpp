@@ -73,6 +73,7 @@ std::string bridgeKeysText(const ports::jtag::BridgeSettings& settings) {
     std::snprintf(instruction, sizeof instruction, "0x%llx", static_cast<unsigned long long>(settings.instruction));
     std::string text = "bridge=" + settings.name + ",ir=" + instruction + ",irlen=" + std::to_string(settings.irLength);
     if (settings.misoDelay) text += ",delay=" + std::to_string(*settings.misoDelay);
+    if (settings.chain.tapCount() > 1) text += ",chain=" + ports::jtag::formatJtagChain(settings.chain, settings.irLength);
     return text;
 }
 

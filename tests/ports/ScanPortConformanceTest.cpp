@@ -102,6 +102,10 @@ struct BoardJtagSpiInstance {
     static constexpr const char* kAddress = "board:flash.bin";
     static constexpr bool kReadsBack = true;
 };
+struct BoardInAChainInstance {
+    static constexpr const char* kAddress = "board:flash.bin,chain=8:[6]:4";
+    static constexpr bool kReadsBack = true;
+};
 struct BoardShiftDrInstance {
     static constexpr const char* kAddress = "board:flash.bin,bridge=shiftdr,delay=2";
     static constexpr bool kReadsBack = true;
@@ -133,7 +137,8 @@ struct OpenOcdInstance {
 };
 
 using Instances =
-    ::testing::Types<SimInstance, SvfInstance, BoardJtagSpiInstance, BoardShiftDrInstance, OpenOcdInstance>;
+    ::testing::Types<SimInstance, SvfInstance, BoardJtagSpiInstance, BoardInAChainInstance, BoardShiftDrInstance,
+                     OpenOcdInstance>;
 TYPED_TEST_SUITE(ScanPortConformance, Instances);
 
 TYPED_TEST(ScanPortConformance, StartsHealthyAndSaysWhatItIs) {

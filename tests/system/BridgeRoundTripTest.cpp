@@ -23,6 +23,7 @@ namespace fs = std::filesystem;
 struct BridgeCase {
     const char* bridge;
     std::optional<unsigned> delay;
+    const char* chain = "[6]";  // from TDI, the bridge's TAP in brackets
 };
 
 class BridgeRoundTrip : public ::testing::TestWithParam<BridgeCase> {};
@@ -38,6 +39,8 @@ TEST_P(BridgeRoundTrip, RecordedProgramPlaysOnABoardWithThatBridge) {
     svf::SvfRecorderOptions options;
     options.bridgeSettings.name = row.bridge;
     options.bridgeSettings.misoDelay = row.delay;
+    unsigned irLength = 0;
+    options.bridgeSettings.chain = ports::jtag::parseJtagChain(row.chain, irLength);
     options.bridge = ports::jtag::makeBridge(options.bridgeSettings);
     options.tckHz = 10'000'000;
     {
@@ -52,7 +55,8 @@ TEST_P(BridgeRoundTrip, RecordedProgramPlaysOnABoardWithThatBridge) {
     auto playOnFreshBoard = [&](const std::string& text, sim::FlashModel& flash) {
         ports::jtag::BoardSettings settings;
         settings.bridge = row.bridge;
-        settings.misoDelay = row.delay.value_or(1);
+        settings.misoDelay = row.delay.value_or(1);  // the bridge's own register; the chain adds its TAPs
+        settings.chain = options.bridgeSettings.chain;
         ports::jtag::BoardModel board(flash, settings);
         ports::jtag::BoardSvfPlayer player(board);
         return player.playText(text);
@@ -84,12 +88,14 @@ TEST_P(BridgeRoundTrip, RecordedProgramPlaysOnABoardWithThatBridge) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Bridges, BridgeRoundTrip,
-                         ::testing::Values(BridgeCase{"jtagspi", {}}, BridgeCase{"shiftdr", {}},
+                         ::testing::Values(BridgeCase{"jtagspi", {}}, BridgeCase{"jtagspi", {}, "8,5,[6],4"},
+                                           BridgeCase{"shiftdr", {}},
                                            BridgeCase{"shiftdr", 0u}, BridgeCase{"shiftdr", 3u},
                                            BridgeCase{"direct", {}}),
                          [](const auto& info) {
                              return std::string(info.param.bridge) +
-                                    (info.param.delay ? "Delay" + std::to_string(*info.param.delay) : "");
+                                    (info.param.delay ? "Delay" + std::to_string(*info.param.delay) : "") +
+                                    (std::string(info.param.chain) != "[6]" ? "InAChain" : "");
                          });
 
 }  // namespace

@@ -20,7 +20,29 @@ BoardModel::BoardModel(sim::FlashModel& flash, BoardSettings settings)
     flash_.setClockHz(settings_.tckHz);
     tckPeriodPs_ = 1'000'000'000'000ull / settings_.tckHz;
     ir_ = settings_.idcodeInstruction & mask(settings_.irLength);
+    for (unsigned length : settings_.chain.irLengthsBefore) before_.push_back({length});
+    for (unsigned length : settings_.chain.irLengthsAfter) after_.push_back({length});
 }
+
+bool BoardModel::otherTdo(const OtherTap& tap) const {
+    if (state_ == TapState::ShiftIr) return tap.irShift & 1u;
+    if (state_ == TapState::ShiftDr) return tap.bypass;
+    return true;
+}
+
+void BoardModel::clockOther(OtherTap& tap, bool tdi) const {
+    switch (state_) {
+    case TapState::CaptureIr: tap.irShift = 0x1; break;
+    case TapState::ShiftIr:
+        tap.irShift = (tap.irShift >> 1) | (static_cast<std::uint64_t>(tdi) << (tap.irLength - 1));
+        break;
+    case TapState::CaptureDr: tap.bypass = false; break;
+    case TapState::ShiftDr: tap.bypass = tdi; break;
+    default: break;
+    }
+}
+
+bool BoardModel::bridgeTapTdi() const { return before_.empty() ? tdi_ : otherTdo(before_.back()); }
 
 // The ideal bridge needs no instruction: every DR scan reaches the flash.
 bool BoardModel::bridgeSelected() const {
@@ -33,12 +55,14 @@ void BoardModel::resetTap() {
     ir_ = settings_.idcodeInstruction & mask(settings_.irLength);
 }
 
-bool BoardModel::tdo() {
+bool BoardModel::tdo() { return after_.empty() ? bridgeTapTdo() : otherTdo(after_.back()); }
+
+bool BoardModel::bridgeTapTdo() {
     if (state_ == TapState::ShiftIr) return irShift_ & 1u;
     if (state_ != TapState::ShiftDr) return true;
     if (!bridgeSelected()) return drShift_ & 1u;
     if (bridge_->clocksBeforeTdo() && !bridgeClockedThisCycle_) {
-        bridge_->shiftClock(tdi_);
+        bridge_->shiftClock(bridgeTapTdi());
         bridgeClockedThisCycle_ = true;
     }
     return bridge_->tdo();
@@ -53,8 +77,16 @@ void BoardModel::setPins(bool tck, bool tms, bool tdi) {
     if (tck) risingEdge(tms, tdi);
 }
 
-void BoardModel::risingEdge(bool tms, bool tdi) {
+void BoardModel::risingEdge(bool tms, bool pinTdi) {
     ++cycles_;
+    // Every register of the chain samples its neighbour's output from
+    // before this edge: the TAPs after the bridge's first (from the TDO
+    // end), then the bridge's, then those before it.
+    tdi_ = pinTdi;
+    const bool tdi = bridgeTapTdi();
+    const bool bridgeOut = bridgeTapTdo();
+    for (std::size_t k = after_.size(); k-- > 0;) clockOther(after_[k], k == 0 ? bridgeOut : otherTdo(after_[k - 1]));
+    for (std::size_t k = before_.size(); k-- > 0;) clockOther(before_[k], k == 0 ? pinTdi : otherTdo(before_[k - 1]));
     const bool user = bridgeSelected();
     if (state_ == TapState::ShiftDr && user && !bridgeClockedThisCycle_) {
         bridge_->shiftClock(tdi);

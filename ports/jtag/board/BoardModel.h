@@ -1,10 +1,12 @@
 #pragma once
 // A simulated JTAG board: one TAP (IDCODE, BYPASS and a bridge's user
-// instruction) with a SPI flash behind the bridge, driven pin by pin as a
+// instruction) with a SPI flash behind the bridge, optionally between other
+// TAPs of a chain, driven pin by pin as a
 // JTAG adapter drives a real one. Time on the flash advances one TCK
 // period per cycle, so a board that only counts clocks (an SVF run whose
 // waits arrive as TCK cycles) still sees busy times pass.
 
+#include "ports/jtag/JtagChain.h"
 #include "ports/jtag/board/BridgeGateware.h"
 #include "ports/jtag/board/TapState.h"
 #include "ports/sim/FlashModel.h"
@@ -12,6 +14,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <vector>
 
 namespace vorant::ports::jtag {
 
@@ -23,6 +26,9 @@ struct BoardSettings {
     std::uint32_t idcode = 0x0362D093;
     unsigned misoDelay = 1;
     std::uint32_t tckHz = 10'000'000;
+    // Other TAPs on the chain, in BYPASS-only form: an IR of their length
+    // that captures ...01, and a one-bit DR.
+    JtagChain chain;
 };
 
 class BoardModel {
@@ -52,11 +58,23 @@ public:
     const BoardSettings& settings() const { return settings_; }
 
 private:
+    struct OtherTap {
+        unsigned irLength;
+        std::uint64_t irShift = 0;
+        bool bypass = false;
+    };
+
     void risingEdge(bool tms, bool tdi);
     bool bridgeSelected() const;
+    bool otherTdo(const OtherTap& tap) const;
+    void clockOther(OtherTap& tap, bool tdi) const;
+    // TDI and TDO of the bridge's own TAP, inside the chain.
+    bool bridgeTapTdi() const;
+    bool bridgeTapTdo();
 
     sim::FlashModel& flash_;
     BoardSettings settings_;
+    std::vector<OtherTap> before_, after_;  // TDI side first
     std::unique_ptr<BridgeGateware> bridge_;
     std::uint64_t tckPeriodPs_;
 

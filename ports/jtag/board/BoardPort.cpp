@@ -18,13 +18,20 @@ namespace {
 }  // namespace
 
 BoardSettings boardFor(const BridgeSettings& bridge, const PortAddress& address) {
-    if (bridge.chain.tapCount() != 1)
-        refuse("--port " + address.text + ": the simulated board has one TAP; give no other TAPs in chain=");
     BoardSettings board;
     board.bridge = bridge.name;
     board.irLength = bridge.irLength;
     board.userInstruction = bridge.instruction;
-    board.misoDelay = bridge.misoDelay.value_or(bridge.name == "direct" ? 0 : 1);
+    board.chain = bridge.chain;
+    // The host's delay counts every clock between MISO and TDO; on the
+    // board each other TAP's bypass register is one of them, the bridge's
+    // own registers the rest.
+    const unsigned others = static_cast<unsigned>(bridge.chain.tapCount() - 1);
+    const unsigned delay = bridge.misoDelay.value_or(bridge.name == "direct" ? 0 : bridge.name == "jtagspi" ? others + 1 : 1);
+    if (delay < others)
+        refuse("--port " + address.text + ": delay=" + std::to_string(delay) + " is less than the " +
+               std::to_string(others) + " other TAPs of the chain delay MISO");
+    board.misoDelay = delay - others;
     if (address.keys.count("tck-hz"))
         board.tckHz = static_cast<std::uint32_t>(keyNumber(address, "tck-hz", 1'000'000'000));
     if (board.tckHz == 0) refuse("--port " + address.text + ": tck-hz=0; give 1 to 1000000000");

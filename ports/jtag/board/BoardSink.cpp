@@ -6,12 +6,22 @@ namespace vorant::ports::jtag {
 
 BoardSink::BoardSink(BoardModel& board) : board_(board) { resetToIdle(board_); }
 
+// The other TAPs of the chain get BYPASS (all ones) in IR and one bit in
+// DR; the TAPs nearest TDO are shifted first.
 bool BoardSink::irScan(unsigned bits, std::uint64_t value) {
-    BitBuffer ir;
-    ir.assign(bits, false);
-    for (unsigned k = 0; k < bits && k < 64; ++k) ir.setBit(k, (value >> k) & 1u);
+    const JtagChain& chain = board_.settings().chain;
+    BitBuffer ir, ones;
+    ones.assign(chain.irBitsAfter(), true);
+    ir.append(ones.data(), ones.size());
+    for (unsigned k = 0; k < bits; ++k) {
+        ir.appendZeros(1);
+        ir.setBit(ir.size() - 1, k < 64 && ((value >> k) & 1u));
+    }
+    ones.assign(chain.irBitsBefore(), true);
+    ir.append(ones.data(), ones.size());
     scanIr(board_, ir, scratch_);
-    if (bits < 2 || !scratch_.bit(0) || scratch_.bit(1)) {
+    const std::size_t at = chain.irBitsAfter();
+    if (bits < 2 || !scratch_.bit(at) || scratch_.bit(at + 1)) {
         error_ = "the TAP's IR did not capture ...01 (is the IR length " + std::to_string(bits) + " right?)";
         return false;
     }
@@ -19,7 +29,20 @@ bool BoardSink::irScan(unsigned bits, std::uint64_t value) {
 }
 
 bool BoardSink::drScan(const BitBuffer& tdi, BitBuffer* tdo) {
-    scanDr(board_, tdi, tdo != nullptr ? *tdo : scratch_);
+    const JtagChain& chain = board_.settings().chain;
+    if (chain.tapCount() == 1) {
+        scanDr(board_, tdi, tdo != nullptr ? *tdo : scratch_);
+        return true;
+    }
+    BitBuffer padded;
+    padded.appendZeros(chain.tapsAfter());
+    padded.append(tdi.data(), tdi.size());
+    padded.appendZeros(chain.tapsBefore());
+    scanDr(board_, padded, scratch_);
+    if (tdo != nullptr) {
+        tdo->clear();
+        tdo->appendRange(scratch_.data(), chain.tapsAfter(), tdi.size());
+    }
     return true;
 }
 
