@@ -27,10 +27,11 @@ void JtagPort::select() {
     transactionFailed_ = false;
 }
 
-void JtagPort::shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec* tdoMask, bool capture) {
+// A live port compares nothing itself: the device checks what it reads,
+// so the mask plays no part here.
+void JtagPort::shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec* /*tdoMask*/, bool capture) {
     const std::size_t at = mosi_.size();
     mosi_.append(tdi.data(), tdi.length());
-    (void)tdoMask;
     if (capture && tdo != nullptr) {
         reads_ = true;
         capture_ = tdo;
