@@ -1,15 +1,17 @@
 #include "cli/CommandLine.h"
 
-#include "cli/SimFaultOption.h"
 #include "cli/UsageError.h"
 #include "cli/WholeNumberOption.h"
 #include "host/UT_STR.h"
+#include "ports/PortError.h"
+#include "ports/PortTable.h"
 
 #include <CLI/CLI.hpp>
 
 #include <algorithm>
 #include <cstdint>
 #include <limits>
+#include <map>
 #include <sstream>
 
 namespace vorant::cli {
@@ -25,13 +27,8 @@ std::string operationsHelp() {
     text << "Operations:\n";
     for (const OperationInfo& info : operationCatalog())
         text << "  " << info.synopsis << "\n      " << info.purpose << "\n";
-    text << "\nPorts (--port):\n"
-            "  sim          a simulated chip, erased at every start (the default)\n"
-            "  sim:FILE     a simulated chip whose memory and status registers live in FILE\n"
-            "  svf:FILE     record the scans as SVF into FILE; the file appears only when the\n"
-            "               operation succeeds (a failed or cancelled run leaves no file and\n"
-            "               leaves an existing FILE untouched)\n"
-            "\nReadback files (readback -f FILE):\n"
+    text << "\nPorts (--port KIND[:PATH][,KEY=VALUE...]):\n" << ports::portHelp()
+         <<             "\nReadback files (readback -f FILE):\n"
             "  FILE appears only when the readback succeeds: a failed or cancelled readback\n"
             "  leaves no file and leaves an existing FILE untouched. Through a symbolic link\n"
             "  the file it points to is replaced. A FIFO or a device is written as the data\n"
@@ -83,6 +80,9 @@ struct ParsedValues {
     bool dataWidthGiven = false, clockGiven = false, offsetGiven = false;
     bool debug = false, quiet = false, version = false, force = false;
     std::vector<std::string> simFaults;
+    // Every key of the port table's rows, also accepted as --KEY VALUE.
+    std::map<std::string, std::string> portKeys;
+    std::vector<std::string> portKeysGiven;
 };
 
 void defineOptions(CLI::App& app, ParsedValues& values) {
@@ -92,7 +92,7 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
                    "The flash part, or 'auto' to identify it by its JEDEC ID (default: auto; the SVF port "
                    "needs a name)")
         ->type_name("NAME|auto");
-    app.add_option("--port", values.port, "Where the scans go: sim, sim:FILE or svf:FILE (default: sim)")
+    app.add_option("--port", values.port, "Where the scans go: " + ports::portNames() + " (default: sim; see Ports)")
         ->type_name("PORT");
     app.add_option("--chip", values.chip,
                    "The part the simulator plays (default: --part, or " + std::string(kDefaultSimulatedChip) +
@@ -120,6 +120,15 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
                  "Write to a chip whose JEDEC ID is not the part's (the check before every write is skipped)");
     app.add_flag("--debug", values.debug, "Show debug traces");
     app.add_flag("--quiet", values.quiet, "Show only errors: no status lines, progress or summary");
+    // The ports' own keys: the tool knows them only from the port table.
+    for (const ports::PortInfo& row : ports::portTable()) {
+        for (const ports::PortKey& key : row.keys) {
+            if (values.portKeys.count(key.name)) continue;
+            app.add_option("--" + key.name, values.portKeys[key.name], key.purpose + " (as ," + key.name + "= in --port)")
+                ->type_name(key.valueName)
+                ->group("Port options (where the port takes them)");
+        }
+    }
     // For tests and demonstrations: faults the simulated chip injects.
     app.add_option("--sim-fault", values.simFaults, "")
         ->expected(1)
@@ -168,7 +177,20 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.part = values.part;
     if (options.part.empty()) throw UsageError("--part needs a part name or 'auto'");
     if (UT_STR::ICompare(options.part.c_str(), "auto") == 0) options.part = "auto";
-    options.port = parsePortChoice(values.port);
+    try {
+        options.port = ports::parsePortAddress(values.port);
+        const ports::PortInfo& row = *ports::findPort(options.port.kind);
+        for (const std::string& key : values.portKeysGiven) {
+            if (!row.takesKey(key))
+                throw UsageError("--" + key + " does not apply to --port " + row.name);
+            if (options.port.keys.count(key))
+                throw UsageError("--" + key + " and ," + key + "= in --port are both given; give one");
+            options.port.keys[key] = values.portKeys.at(key);
+        }
+        ports::checkPortAddress(options.port, row);
+    } catch (const ports::PortError& error) {
+        throw UsageError(error.what());
+    }
     if (!values.chip.empty()) options.chip = values.chip;
     options.partFiles = values.partFiles;
     options.index = static_cast<int>(
@@ -196,8 +218,6 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.quiet = values.quiet;
     options.force = values.force;
     options.simFaults = values.simFaults;
-    // Checked now so a bad fault is a usage error before anything runs.
-    simFaultPlan(options.simFaults);
     return options;
 }
 
@@ -229,6 +249,8 @@ CommandLine parseCommandLine(const std::vector<std::string>& arguments) {
     values.dataWidthGiven = app.count("--data-width") > 0;
     values.clockGiven = app.count("--clock") > 0;
     values.offsetGiven = app.count("--offset") > 0;
+    for (const auto& [key, value] : values.portKeys)
+        if (app.count("--" + key) > 0) values.portKeysGiven.push_back(key);
     if (values.version) {
         result.action = CommandLine::Action::ShowVersion;
         return result;

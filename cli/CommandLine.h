@@ -1,7 +1,7 @@
 #pragma once
 #include "cli/OperationRequest.h"
-#include "cli/PortChoice.h"
 #include "formats/ConfigDataFiles.h"
+#include "ports/PortAddress.h"
 
 #include <cstdint>
 #include <optional>
@@ -16,7 +16,8 @@ inline constexpr const char* kDefaultSimulatedChip = "W25Q128JV";
 // The tool's own options, given before or after the operation.
 struct ToolOptions {
     std::string part = "auto";         // a part name, or "auto": identify by JEDEC ID
-    PortChoice port;                     // default: a fresh simulated chip
+    // Where the scans go: the port table's row `port.kind`.
+    ports::PortAddress port{.text = "sim", .kind = "sim"};
     std::optional<std::string> chip;   // the simulated chip, when not the --part
     std::vector<std::string> partFiles;
     int index = 0;

@@ -23,7 +23,8 @@
 #include "host/ConstraintsManager.h"
 #include "host/UT_STR.h"
 #include "host/VorantException.h"
-#include "ports/svf/SvfError.h"
+#include "ports/PortError.h"
+#include "ports/PortTable.h"
 #include "s/Type1SPIDevice.h"
 
 #include <algorithm>
@@ -37,27 +38,30 @@ namespace vorant::cli {
 
 namespace {
 
-void checkPortFitsRequest(const ToolOptions& options, const OperationInfo& info) {
-    if (options.port.isSimulator()) return;
+// Whether the port can carry out the request, decided by what it can do.
+void checkPortFitsRequest(const ToolOptions& options, const OperationInfo& info, const ports::PortCaps& caps) {
+    checkPortOptions(options);
+    const std::string port = "--port " + options.port.kind;
+    if (caps.readsBack) return;
     if (options.autoPart())
-        throw UsageError("the SVF port has no chip to identify; name the part with --part NAME");
-    if (options.chip) throw UsageError("--chip names the simulated chip and does not apply to --port svf");
-    if (options.clockHz) throw UsageError("--clock sets the simulator's clock and does not apply to --port svf");
-    if (!options.simFaults.empty()) throw UsageError("--sim-fault applies to the simulator only");
+        throw UsageError(port + " reads nothing back, so it cannot identify the chip; name the part with --part NAME");
     if (!info.recordable)
-        throw UsageError("'" + std::string(info.name) +
-                         "' answers from what it reads, and a recording reads nothing; run it with --port sim");
+        throw UsageError("'" + std::string(info.name) + "' answers from what it reads, and " + port +
+                         " reads nothing; run it on a port that reads the chip, such as --port sim");
 }
 
 // The port's own file must not double as the operation's file: a readback
 // would replace the simulated flash's backing file under it, and a
 // recording would replace the image it was made from.
-void checkFilesApart(const ToolOptions& options, const OperationInfo& info, const std::string& file) {
-    if (file.empty() || options.port.file.empty() || !sameFile(file, options.port.file)) return;
+void checkFilesApart(const ToolOptions& options, const OperationInfo& info, const ports::PortCaps& caps,
+                     const std::string& file) {
+    const std::string& portFile = options.port.path;
+    if (file.empty() || portFile.empty() || !sameFile(file, portFile)) return;
     if (info.operation == Operation::Readback)
-        throw UsageError("the readback file " + file + " is the simulated flash's own file; choose another name");
-    if (!options.port.isSimulator())
-        throw UsageError("the recording " + options.port.file + " would replace the image " + file +
+        throw UsageError("the readback file " + file + " is the port's own file (--port " + options.port.text +
+                         "); choose another name");
+    if (caps.records)
+        throw UsageError("the recording " + portFile + " would replace the image " + file +
                          "; record into another file");
 }
 
@@ -232,25 +236,27 @@ struct PreparedRun {
 
 PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& request) {
     const OperationInfo& info = *request.info;
-    checkPortFitsRequest(options, info);
+    const ports::PortInfo* row = ports::findPort(options.port.kind);
+    if (row == nullptr) throw UsageError("unknown port '" + options.port.kind + "'; the ports are " + ports::portNames());
+    const ports::PortCaps& caps = row->caps;
+    checkPortFitsRequest(options, info, caps);
     if (!options.autoPart()) {
         checkPartKnown(options.part, "part");
         checkQuadEnableWritable(options.part, request);
     }
     const std::string chip = simulatedChipName(options);
-    if (options.port.isSimulator()) checkPartKnown(chip, "chip");
+    if (caps.simulatesChip) checkPartKnown(chip, "chip");
 
     // Files before the port: a bad file costs no scan and creates nothing.
     PreparedRun run;
     formats::registerStandardFormats(16, options.image.format);
     run.file = request.fileOperand();
-    checkFilesApart(options, info, run.file);
+    checkFilesApart(options, info, caps, run.file);
     if (info.operand == OperandKind::ImageFile) run.image = openImage(run.file, options.image);
     if (info.operation == Operation::Readback) checkReadbackTarget(run.file);
     if (run.image && !options.autoPart()) checkImageFits(*run.image, run.file, options.part);
 
-    run.session = options.port.isSimulator() ? PortSession::openSimulator(options, chip)
-                                             : PortSession::openRecorder(options, options.part);
+    run.session = PortSession::open(options, options.autoPart() ? std::string() : options.part);
     run.part = options.part;
     std::optional<Identification> identification;
     try {
@@ -312,9 +318,9 @@ bool signatureMatches(Type1SPIDevice& device, const std::string& part) {
 // A recording appears only when the operation succeeded; otherwise it is
 // dropped and an older file of the same name stays as it was.
 void finishRecording(PortSession& session, const std::string& target, int& status, RunFigures& figures) {
-    if (session.recorder() == nullptr) return;
+    if (!session.caps().records) return;
     if (status != kExitSuccess) {
-        const bool streamed = !session.recorder()->replacesTarget();
+        const bool streamed = session.writesInPlace();
         session.abandon();
         toolInfo(streamed ? streamedOutputNote(target, "recording")
                           : "Nothing was recorded: " + target + " is written only when the operation succeeds.");
@@ -323,7 +329,7 @@ void finishRecording(PortSession& session, const std::string& target, int& statu
     try {
         session.commit();
         figures.recordedFile = target;
-    } catch (const svf::SvfError& error) {
+    } catch (const ports::PortError& error) {
         toolError(std::string("the recording could not be completed: ") + error.what());
         status = kExitFailure;
         figures.outcome = RunOutcome::Failed;
@@ -378,6 +384,16 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         toolError(std::string("the operation stopped: ") + error.what());
         result = false;
     }
+    // A live port may still hold writes it batched: they go out now, and a
+    // failure there fails the run.
+    if (!run.session->caps().records) {
+        try {
+            run.session->commit();
+        } catch (const ports::PortError& error) {
+            toolError(error.what());
+            result = false;
+        }
+    }
     // Every operation that stops early for a cancel returns false; one that
     // saw the cancel only after its last page (or after an erase that no
     // cancel can stop) finished its job, and its result stands.
@@ -415,8 +431,9 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     int status = result && !cancelled ? kExitSuccess : kExitFailure;
     // The device answers a blank check's verdict in an attribute; its
     // result only says whether the check ran. A recording reads nothing, so
-    // it has no verdict: the played file checks.
-    if (status == kExitSuccess && info.operation == Operation::BlankCheck && run.session->simulator() != nullptr) {
+    // it has no verdict: the played file checks. Every port that reads the
+    // chip back has one.
+    if (status == kExitSuccess && info.operation == Operation::BlankCheck && !run.session->port().outputMode()) {
         const char* blank = device.getAttribute(DeviceNS::ATTR_BLANK);
         const bool isBlank = blank != nullptr && UT_STR::ICompare(blank, "TRUE") == 0;
         status = isBlank ? kExitSuccess : kExitFailure;
@@ -433,7 +450,7 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
         sink.setDisplay(nullptr);
         progressPort.setListener(nullptr);
     }
-    finishRecording(*run.session, options.port.file, status, figures);
+    finishRecording(*run.session, options.port.path, status, figures);
     settleOutputFiles(info, run.file, status, figures);
 
     if (!options.quiet) {

@@ -1,85 +1,60 @@
 #include "cli/PortSession.h"
 
-#include "cli/FlashFileAdvice.h"
-#include "cli/SimFaultOption.h"
+#include "cli/ToolFailure.h"
+#include "cli/SvfPlayback.h"
 #include "cli/UsageError.h"
-#include "host/VorantException.h"
-#include "ports/svf/SvfError.h"
+#include "ports/PortError.h"
 
 #include <chrono>
-#include <filesystem>
-#include <system_error>
 
 namespace vorant::cli {
 
-std::unique_ptr<PortSession> PortSession::openSimulator(const ToolOptions& options, const std::string& chipName) {
-    sim::FlashConfig config;
-    try {
-        config = sim::FlashConfig::fromPartDatabase(chipName);
-    } catch (const VorantException& error) {
-        throw UsageError(std::string(error.what()) + "; choose another chip with --chip NAME");
-    }
+namespace {
 
-    const std::string& file = options.port.file;
-    std::error_code error;
-    const bool fileExisted = !file.empty() && std::filesystem::exists(file, error);
+const ports::PortInfo& rowOf(const ToolOptions& options) {
+    const ports::PortInfo* row = ports::findPort(options.port.kind);
+    // The address was checked when the command line was read.
+    if (row == nullptr) throw UsageError("unknown port '" + options.port.kind + "'; the ports are " + ports::portNames());
+    return *row;
+}
 
+}  // namespace
+
+void checkPortOptions(const ToolOptions& options) {
+    const ports::PortInfo& row = rowOf(options);
+    const std::string port = "--port " + row.name;
+    if (options.chip && !row.caps.simulatesChip)
+        throw UsageError("--chip names the simulated chip and does not apply to " + port);
+    if (options.clockHz && !row.caps.hasBusClock)
+        throw UsageError("--clock sets the simulator's clock and does not apply to " + port);
+    if (!options.simFaults.empty() && !row.caps.takesSimFaults)
+        throw UsageError("--sim-fault applies to the simulator only, not to " + port);
+}
+
+std::unique_ptr<PortSession> PortSession::open(const ToolOptions& options, const std::string& partName) {
     std::unique_ptr<PortSession> session(new PortSession);
+    session->row_ = &rowOf(options);
+    ports::PortContext context;
+    context.toolName = "vorant-spi";
+    context.partName = partName;
+    context.chipName = simulatedChipName(options);
+    context.clockHz = options.clockHz;
+    context.simFaults = options.simFaults;
     try {
-        session->simulator_ =
-            std::make_unique<sim::SimScanPort>(config, simFaultPlan(options.simFaults), file);
-    } catch (const VorantException& problem) {
-        throw UsageError(std::string(problem.what()) + "; " + flashFileAdvice(problem));
-    }
-    if (!file.empty() && !fileExisted) session->createdBackingFile_ = file;
-    if (options.clockHz) session->simulator_->setClockHz(*options.clockHz);
-    return session;
-}
-
-std::unique_ptr<PortSession> PortSession::openRecorder(const ToolOptions& options, const std::string& partName) {
-    svf::SvfRecorderOptions recorderOptions;
-    recorderOptions.toolName = "vorant-spi";
-    recorderOptions.partName = partName;
-    std::unique_ptr<PortSession> session(new PortSession);
-    try {
-        session->recorder_ = std::make_unique<svf::SvfRecorder>(options.port.file, recorderOptions);
-    } catch (const svf::SvfError& error) {
-        throw UsageError(std::string(error.what()) + "; record into a folder that exists and can be written");
+        session->port_ = session->row_->open(options.port, context);
+    } catch (const ports::PortError& error) {
+        if (error.kind() == ports::PortError::Kind::BadRequest) throw UsageError(error.what());
+        throw ToolFailure(error.what());
     }
     return session;
-}
-
-ScanPort& PortSession::port() {
-    if (simulator_) return *simulator_;
-    return *recorder_;
-}
-
-std::optional<std::uint64_t> PortSession::simulatedNanoseconds() const {
-    if (!simulator_) return std::nullopt;
-    return simulator_->stats().simulatedNs;
 }
 
 PhaseTimer::Clock PortSession::phaseClock() const {
-    if (simulator_) {
-        const sim::SimScanPort* simulator = simulator_.get();
-        return [simulator] { return static_cast<double>(simulator->stats().simulatedNs) / 1e9; };
+    if (port_->busNanoseconds()) {
+        const ports::Port* port = port_.get();
+        return [port] { return static_cast<double>(port->busNanoseconds().value_or(0)) / 1e9; };
     }
     return [] { return std::chrono::duration<double>(std::chrono::steady_clock::now().time_since_epoch()).count(); };
-}
-
-void PortSession::commit() {
-    if (recorder_ && !recorder_->finished()) recorder_->finish();
-}
-
-void PortSession::abandon() {
-    // The port goes first: it holds the backing file open.
-    simulator_.reset();
-    recorder_.reset();
-    if (!createdBackingFile_.empty()) {
-        std::error_code ignored;
-        std::filesystem::remove(createdBackingFile_, ignored);
-        createdBackingFile_.clear();
-    }
 }
 
 }  // namespace vorant::cli

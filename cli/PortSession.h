@@ -2,8 +2,8 @@
 #include "cli/CommandLine.h"
 #include "cli/PhaseTimer.h"
 #include "host/ScanPort.h"
-#include "ports/sim/SimScanPort.h"
-#include "ports/svf/SvfRecorder.h"
+#include "ports/Port.h"
+#include "ports/PortTable.h"
 
 #include <cstdint>
 #include <memory>
@@ -12,42 +12,41 @@
 
 namespace vorant::cli {
 
-// The scan port of one run: the flash simulator or the SVF recorder.
+// The scan port of one run, opened from its row of the port table.
 class PortSession {
 public:
-    // The simulator playing `chipName`, with the options' backing file,
-    // clock and faults. Throws UsageError when the chip cannot be simulated
-    // or the backing file cannot be used (the file is then left as it was).
-    static std::unique_ptr<PortSession> openSimulator(const ToolOptions& options, const std::string& chipName);
-    // The SVF recorder writing the options' port file for `partName`.
-    // Throws UsageError when the file cannot be written; nothing is created.
-    static std::unique_ptr<PortSession> openRecorder(const ToolOptions& options, const std::string& partName);
+    // Opens the options' port for `partName` (empty while --part auto is
+    // still to identify it). Throws UsageError for a request the port
+    // refuses and ToolFailure when the cable is not there; either way
+    // nothing is left behind.
+    static std::unique_ptr<PortSession> open(const ToolOptions& options, const std::string& partName);
 
-    ScanPort& port();
-    sim::SimScanPort* simulator() { return simulator_.get(); }
-    svf::SvfRecorder* recorder() { return recorder_.get(); }
+    ScanPort& port() { return port_->scan(); }
+    const ports::PortCaps& caps() const { return row_->caps; }
 
-    // Simulated bus time so far; nothing for a recording.
-    std::optional<std::uint64_t> simulatedNanoseconds() const;
+    // Simulated bus time so far; nothing for a port that runs in wall time.
+    std::optional<std::uint64_t> simulatedNanoseconds() const { return port_->busNanoseconds(); }
     // The clock a run's phases are timed by, as its rate is: the simulated
-    // bus time, or the wall clock for a recording.
+    // bus time, or the wall clock.
     PhaseTimer::Clock phaseClock() const;
+    // Whether a failed run's output has already reached its target.
+    bool writesInPlace() const { return port_->writesInPlace(); }
 
-    // Completes a recording: the file appears under its name. Throws
-    // svf::SvfError when it could not be written; for the simulator there
-    // is nothing to do.
-    void commit();
-    // Gives the run up before any operation ran: closes the port and
-    // removes a backing file this session created, so a refused run leaves
-    // no trace. A recording is dropped without a file.
-    void abandon();
+    // Completes the run's output (a recording appears). Throws
+    // ports::PortError when it could not be completed.
+    void commit() { port_->commit(); }
+    // Gives the run up: a refused or failed run leaves no trace.
+    void abandon() { port_->abandon(); }
 
 private:
     PortSession() = default;
 
-    std::unique_ptr<sim::SimScanPort> simulator_;
-    std::unique_ptr<svf::SvfRecorder> recorder_;
-    std::string createdBackingFile_;
+    const ports::PortInfo* row_ = nullptr;
+    std::unique_ptr<ports::Port> port_;
 };
+
+// The port's options as the user gave them, checked against what the
+// port can do. Throws UsageError.
+void checkPortOptions(const ToolOptions& options);
 
 }  // namespace vorant::cli

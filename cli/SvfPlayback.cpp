@@ -1,14 +1,15 @@
 #include "cli/SvfPlayback.h"
 
-#include "cli/FlashFileAdvice.h"
 #include "cli/RunSummary.h"
-#include "cli/SimFaultOption.h"
 #include "cli/Tool.h"
 #include "cli/ToolFailure.h"
 #include "cli/ToolMessages.h"
 #include "cli/UsageError.h"
 #include "host/ConstraintsManager.h"
 #include "host/VorantException.h"
+#include "ports/PortTable.h"
+#include "ports/PortError.h"
+#include "ports/sim/FlashFileAdvice.h"
 #include "ports/sim/FlashModel.h"
 #include "ports/svf/SvfError.h"
 #include "ports/svf/SvfFileCheck.h"
@@ -38,8 +39,14 @@ std::string simulatedChipName(const ToolOptions& options) {
 }
 
 int playRecording(const ToolOptions& options, const std::string& svfFile) {
-    if (!options.port.isSimulator())
-        throw UsageError("'play' plays a file on the simulator; use --port sim or --port sim:FILE");
+    const ports::PortInfo* port = ports::findPort(options.port.kind);
+    if (port == nullptr || port->playSvf == nullptr) {
+        std::string players;
+        for (const ports::PortInfo& row : ports::portTable())
+            if (row.playSvf != nullptr) players += (players.empty() ? "--port " : " or --port ") + row.name;
+        throw UsageError("'play' plays a file on simulated hardware, which --port " + options.port.kind +
+                         " has none of; use " + players);
+    }
     std::error_code error;
     if (!std::filesystem::is_regular_file(svfFile, error))
         throw UsageError(svfFile + ": no such SVF file; give the file a recording run wrote");
@@ -48,12 +55,6 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
     if (!ConstraintsManager::instance().hasPart(chip))
         throw UsageError("unknown part '" + chip + "'; 'vorant-spi parts' lists the known parts");
 
-    sim::FlashConfig config;
-    try {
-        config = sim::FlashConfig::fromPartDatabase(chip);
-    } catch (const VorantException& problem) {
-        throw UsageError(std::string(problem.what()) + "; choose another chip with --chip NAME");
-    }
     // The whole file is checked before the flash exists, so a malformed
     // file, or one that holds nothing to play, leaves no trace.
     svf::SvfContents contents;
@@ -68,21 +69,20 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
         throw ToolFailure(svfFile + ": no scan to play (the file holds no SDR or SIR that shifts a bit); "
                                     "nothing was played");
 
-    svf::SvfPlayerOptions playerOptions;
-    if (options.clockHz) playerOptions.spiClockHz = *options.clockHz;
-    const std::string& backingFile = options.port.file;
+    ports::PortContext context;
+    context.chipName = chip;
+    context.clockHz = options.clockHz;
+    context.simFaults = options.simFaults;
+    const std::string& backingFile = options.port.path;
     const bool backingFileExisted = !backingFile.empty() && std::filesystem::exists(backingFile, error);
     const auto started = std::chrono::steady_clock::now();
     svf::SvfPlayResult result;
     try {
-        sim::FlashModel flash(config, simFaultPlan(options.simFaults), backingFile);
-        svf::SvfPlayer player(flash, playerOptions);
-        std::ifstream in(svfFile, std::ios::binary);
-        if (!in) throw svf::SvfError("cannot read '" + svfFile + "'");
-        svf::SvfParser parser(in);
-        result = player.play(parser);
+        result = port->playSvf(options.port, context, svfFile);
+    } catch (const ports::PortError& problem) {
+        throw UsageError(problem.what());
     } catch (const VorantException& problem) {
-        throw UsageError(std::string(problem.what()) + "; " + flashFileAdvice(problem));
+        throw UsageError(std::string(problem.what()) + "; " + sim::flashFileAdvice(problem));
     } catch (const svf::SvfError& problem) {
         // Nothing was played: a backing file made for this run goes again.
         if (!backingFile.empty() && !backingFileExisted) std::filesystem::remove(backingFile, error);

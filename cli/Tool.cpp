@@ -10,6 +10,7 @@
 #include "cli/UsageError.h"
 #include "host/MessageSinks.h"
 #include "host/OutputTarget.h"
+#include "ports/PortTable.h"
 
 #include <csignal>
 #include <cstdio>
@@ -71,7 +72,8 @@ bool dataOnStandardOutput(const CommandLine& command) {
     if (info != nullptr && info->operation == Operation::Readback &&
         isStandardOutputTarget(command.request.fileOperand()))
         return true;
-    return !command.options.port.isSimulator() && isStandardOutputTarget(command.options.port.file);
+    const ports::PortInfo* port = ports::findPort(command.options.port.kind);
+    return port != nullptr && port->caps.records && isStandardOutputTarget(command.options.port.path);
 }
 
 // A reader that goes away (`vorant-spi program ... | head -1`) must not end

@@ -55,17 +55,16 @@ bool SimScanPort::shiftFails(int stage, const RLBitVec* tdi) {
     return false;
 }
 
-void SimScanPort::openTransaction() {
-    if (open_) closeTransaction();
+void SimScanPort::select() {
     model_.select();
-    open_ = true;
     ++stats_.transactions;
 }
 
-void SimScanPort::closeTransaction() {
-    open_ = false;
-    model_.deselect();
+void SimScanPort::shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec*, bool capture) {
+    clock(tdi, capture ? tdo : nullptr);
 }
+
+void SimScanPort::deselect() { model_.deselect(); }
 
 bool SimScanPort::shift(int stage, RLBitVec* tdi, RLBitVec*, RLBitVec* tdo, RLBitVec*) {
     const bool ok = shiftOnce(stage, tdi, tdo);
@@ -76,40 +75,13 @@ bool SimScanPort::shift(int stage, RLBitVec* tdi, RLBitVec*, RLBitVec* tdo, RLBi
 bool SimScanPort::shiftOnce(int stage, RLBitVec* tdi, RLBitVec* tdo) {
     ++stats_.shiftCalls;
     if (shiftFails(stage, tdi)) return false;
-    if (tdi == nullptr) return fail("shift without bits to drive");
-    const bool continues = stage == ScanStage::kContinue || stage == ScanStage::kClose ||
-                           stage == ScanStage::kCaptureClose;
-    if (continues && !open_) {
-        // The shift that should have opened the transaction failed: its
-        // reason is the one worth keeping.
-        if (lastCallFailed_) return false;
-        return fail("shift stage " + std::to_string(stage) + " without an open transaction");
-    }
     try {
-        switch (stage) {
-        case ScanStage::kWhole:
-            openTransaction();
-            clock(*tdi, nullptr);
-            closeTransaction();
-            return true;
-        case ScanStage::kOpen:
-            openTransaction();
-            clock(*tdi, nullptr);
-            return true;
-        case ScanStage::kContinue:
-            clock(*tdi, nullptr);
-            return true;
-        case ScanStage::kClose:
-            clock(*tdi, nullptr);
-            closeTransaction();
-            return true;
-        case ScanStage::kCaptureClose:
-            clock(*tdi, tdo);
-            closeTransaction();
-            return true;
-        default:
-            return fail("unknown shift stage " + std::to_string(stage));
-        }
+        const ports::FramingFault fault = framer_.shift(stage, tdi, tdo, nullptr);
+        // A continuing shift after a failed opening one: the opening shift's
+        // reason is the one worth keeping.
+        if (fault == ports::FramingFault::NothingOpen && lastCallFailed_) return false;
+        if (fault != ports::FramingFault::None) return fail(ports::describeFramingFault(fault, stage));
+        return true;
     } catch (const std::exception& error) {
         return fail(error.what());
     }
@@ -121,9 +93,10 @@ bool SimScanPort::transaction(const RLBitVec& tdi, RLBitVec* captured) {
     ++stats_.shiftCalls;
     if (shiftFails(ScanStage::kWhole, &tdi)) return false;
     try {
-        openTransaction();
+        framer_.closeOpenTransaction();
+        select();
         clock(tdi, captured);
-        closeTransaction();
+        deselect();
         return true;
     } catch (const std::exception& error) {
         return fail(error.what());
@@ -133,7 +106,7 @@ bool SimScanPort::transaction(const RLBitVec& tdi, RLBitVec* captured) {
 bool SimScanPort::wait(int time, bool) {
     ++stats_.waitCalls;
     try {
-        if (open_) closeTransaction();
+        framer_.closeOpenTransaction();
     } catch (const std::exception& error) {
         return fail(error.what());
     }

@@ -7,6 +7,7 @@
 #include "host/ScanPort.h"
 #include "ports/sim/FaultPlan.h"
 #include "ports/sim/FlashModel.h"
+#include "ports/wire/TransactionFramer.h"
 
 #include <atomic>
 #include <cstdint>
@@ -24,7 +25,7 @@ struct SimStats {
     std::uint64_t simulatedNs = 0;   // clocks plus waits
 };
 
-class SimScanPort : public ScanPort {
+class SimScanPort : public ScanPort, private ports::TransactionSink {
 public:
     // The port owns its chip. backingFile: see FlashModel.
     explicit SimScanPort(FlashConfig config, FaultPlan faults = FaultPlan{},
@@ -76,15 +77,17 @@ private:
     bool shiftFails(int stage, const RLBitVec* tdi);
     bool opensPageTransaction(int stage, const RLBitVec* tdi) const;
     bool shiftOnce(int stage, RLBitVec* tdi, RLBitVec* tdo);
-    void openTransaction();
-    void closeTransaction();
+    // --- ports::TransactionSink: the chip-select edges and the clocks ---
+    void select() override;
+    void shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec* tdoMask, bool capture) override;
+    void deselect() override;
     void clock(const RLBitVec& tdi, RLBitVec* captured);
     bool fail(const std::string& why);
 
     FlashModel model_;
     FaultPlan faults_;
+    ports::TransactionFramer framer_{*this};
     std::atomic<bool> cancel_{false};
-    bool open_ = false;
     bool disconnected_ = false;
     bool lastCallFailed_ = false;  // the shift before this one failed
     std::uint64_t pageTransactions_ = 0;

@@ -8,6 +8,7 @@
 #include "ports/svf/SvfSeconds.h"
 
 #include <algorithm>
+#include <cstdio>
 #include <ctime>
 #include <sstream>
 #include <utility>
@@ -66,6 +67,16 @@ std::filesystem::path checkedTarget(std::filesystem::path target, const SvfRecor
     return target;
 }
 
+// The bridge as port keys, so a player can set up the same board.
+std::string bridgeKeysText(const ports::jtag::BridgeSettings& settings) {
+    char instruction[24];
+    std::snprintf(instruction, sizeof instruction, "0x%llx", static_cast<unsigned long long>(settings.instruction));
+    std::string text = "bridge=" + settings.name + ",ir=" + instruction + ",irlen=" + std::to_string(settings.irLength);
+    if (settings.misoDelay) text += ",delay=" + std::to_string(*settings.misoDelay);
+    if (settings.chain.tapCount() > 1) text += ",chain=" + ports::jtag::formatJtagChain(settings.chain, settings.irLength);
+    return text;
+}
+
 std::string utcDate() {
     const std::time_t now = std::time(nullptr);
     const std::tm* utc = std::gmtime(&now);
@@ -84,7 +95,7 @@ void appendClipped(BitBuffer& out, const RLBitVec* vector, std::size_t bits) {
 }  // namespace
 
 SvfRecorder::SvfRecorder(std::filesystem::path target, SvfRecorderOptions options) try
-    : file_(checkedTarget(std::move(target), options)) {
+    : file_(checkedTarget(std::move(target), options)), bridge_(options.bridge), tckHz_(options.tckHz) {
     buffer_.reserve(kFlushThreshold + 64 * 1024);
     writeHeader(options);
     flushBuffer();
@@ -98,9 +109,53 @@ void SvfRecorder::writeHeader(const SvfRecorderOptions& options) {
     if (!options.toolName.empty()) buffer_ += "// SVF written by " + oneLine(options.toolName) + "\n";
     if (!options.partName.empty()) buffer_ += "// Part: " + oneLine(options.partName) + "\n";
     if (options.timestamp) buffer_ += "// Date: " + utcDate() + "\n";
-    buffer_ += "// One SDR per SPI transaction: chip select is asserted for the length of each SDR.\n";
+    if (bridge_ == nullptr)
+        buffer_ += "// One SDR per SPI transaction: chip select is asserted for the length of each SDR.\n";
+    else
+        buffer_ += "// One SDR per SPI transaction, framed for the " + bridge_->name() + " bridge.\n" +
+                   std::string(kBridgeLinePrefix) + bridgeKeysText(options.bridgeSettings) + "\n";
     buffer_ += kSetup;
+    if (bridge_ != nullptr) writeBridgeSelection(options);
     buffer_ += joinedPreamble(options.preamble);
+}
+
+namespace {
+
+// A scan of `bits` bits all set to `ones`, as an SVF TDI value; nothing
+// for none, as the set-up already cleared every header and trailer.
+std::string constantScan(const char* command, std::size_t bits, bool ones) {
+    if (bits == 0) return {};
+    std::string line = std::string(command) + " " + std::to_string(bits);
+    {
+        BitBuffer value;
+        value.assign(bits, ones);
+        line += " TDI (";
+        appendSvfHex(line, value.data(), bits, SvfRecorder::kDigitsPerLine);
+        line += ")";
+    }
+    return line + ";\n";
+}
+
+}  // namespace
+
+// The other TAPs of the chain sit in BYPASS (an all-ones instruction, one
+// bypass bit each); SVF's header is shifted first, so it covers the TAPs
+// between the bridge and TDO.
+void SvfRecorder::writeBridgeSelection(const SvfRecorderOptions& options) {
+    const ports::jtag::BridgeSettings& settings = options.bridgeSettings;
+    const ports::jtag::JtagChain& chain = settings.chain;
+    buffer_ += constantScan("HIR", chain.irBitsAfter(), true);
+    buffer_ += constantScan("TIR", chain.irBitsBefore(), true);
+    buffer_ += constantScan("HDR", chain.tapsAfter(), false);
+    buffer_ += constantScan("TDR", chain.tapsBefore(), false);
+    if (!bridge_->selectsInstruction()) return;
+    BitBuffer instruction;
+    instruction.assign(settings.irLength, false);
+    for (unsigned k = 0; k < settings.irLength && k < 64; ++k)
+        instruction.setBit(k, (settings.instruction >> k) & 1u);
+    buffer_ += "SIR " + std::to_string(settings.irLength) + " TDI (";
+    appendSvfHex(buffer_, instruction.data(), settings.irLength, kDigitsPerLine);
+    buffer_ += ");\n";
 }
 
 void SvfRecorder::comment(const char* text) {
@@ -110,7 +165,7 @@ void SvfRecorder::comment(const char* text) {
 }
 
 void SvfRecorder::writeCommentLines(const char* text) {
-    std::string& out = open_ ? heldComments_ : buffer_;
+    std::string& out = framer_.transactionOpen() ? heldComments_ : buffer_;
     // Every line of the text becomes a comment line of its own, so a text
     // with line breaks can never turn into statements.
     std::string_view rest(text);
@@ -128,28 +183,11 @@ void SvfRecorder::writeCommentLines(const char* text) {
 }
 
 bool SvfRecorder::shift(int stage, RLBitVec* tdi, RLBitVec* /*tdiMask*/, RLBitVec* tdo, RLBitVec* tdoMask) {
-    if (!usable() || tdi == nullptr) return false;
-    switch (stage) {
-    case ScanStage::kWhole:
-        closeTransaction();
-        addShift(*tdi, tdo, tdoMask);
-        closeTransaction();
-        break;
-    case ScanStage::kOpen:
-        closeTransaction();
-        addShift(*tdi, tdo, tdoMask);
-        break;
-    case ScanStage::kContinue:
-        if (!open_) return false;  // nothing selected the chip: as the simulator, refuse
-        addShift(*tdi, tdo, tdoMask);
-        break;
-    case ScanStage::kClose:
-    case ScanStage::kCaptureClose:
-        if (!open_) return false;
-        addShift(*tdi, tdo, tdoMask);
-        closeTransaction();
-        break;
-    default:
+    if (!usable()) return false;
+    // A refused shift records nothing, as the simulator refuses it.
+    const ports::FramingFault fault = framer_.shift(stage, tdi, tdo, tdoMask);
+    if (fault != ports::FramingFault::None) {
+        refusal_ = "SVF recorder: " + ports::describeFramingFault(fault, stage);
         return false;
     }
     flushIfFull();
@@ -164,15 +202,12 @@ bool SvfRecorder::wait(int time, bool /*microseconds: always true*/) {
     if (!usable()) return false;
     // The wait comes after the deselect: a status write only starts when
     // chip select rises.
-    closeTransaction();
-    if (time < 0) return false;
-    if (time > 0) {
-        buffer_ += "RUNTEST ";
-        buffer_ += formatSvfSeconds(static_cast<std::uint64_t>(time));
-        buffer_ += " SEC;\n";
-        ++totals_.runTestCount;
-        totals_.runTestMicroseconds += static_cast<std::uint64_t>(time);
+    framer_.closeOpenTransaction();
+    if (time < 0) {
+        refusal_ = "SVF recorder: wait of a negative time (" + std::to_string(time) + " us)";
+        return false;
     }
+    if (time > 0) writeRunTest(static_cast<std::uint64_t>(time));
     flushIfFull();
     return usable();
 }
@@ -180,15 +215,17 @@ bool SvfRecorder::wait(int time, bool /*microseconds: always true*/) {
 bool SvfRecorder::isCancelled(int /*level*/) { return cancelRequested_.load() || file_.failed(); }
 
 const char* SvfRecorder::failureReason() {
-    if (!file_.failed()) return nullptr;
+    if (!file_.failed()) return refusal_.empty() ? nullptr : refusal_.c_str();
     failureReason_ = file_.target().string() + " could not be written (is the disk full?)";
     return failureReason_.c_str();
 }
 
-void SvfRecorder::addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBitVec* tdoMask) {
+void SvfRecorder::select() {}
+
+// The recorder captures nothing: tdo always holds the bits expected.
+void SvfRecorder::shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec* tdoMask, bool /*capture*/) {
     const std::size_t bits = tdi.length();
     const std::size_t before = tdi_.size();
-    open_ = true;
     tdi_.append(tdi.data(), bits);
     const bool masked = tdoMask != nullptr && anyBitSet(tdoMask->data(), std::min(bits, tdoMask->length()));
     if (masked && !compares_) {
@@ -206,10 +243,8 @@ void SvfRecorder::addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBit
     }
 }
 
-void SvfRecorder::closeTransaction() {
-    if (!open_) return;
+void SvfRecorder::deselect() {
     if (!tdi_.empty()) writeSdr();
-    open_ = false;
     compares_ = false;
     tdi_.clear();
     tdo_.clear();
@@ -218,18 +253,57 @@ void SvfRecorder::closeTransaction() {
     heldComments_.clear();
 }
 
+void SvfRecorder::writeRunTest(std::uint64_t microseconds) {
+    totals_.runTestMicroseconds += microseconds;
+    if (!tckHz_) {
+        buffer_ += "RUNTEST " + formatSvfSeconds(microseconds) + " SEC;\n";
+        ++totals_.runTestCount;
+        return;
+    }
+    // Whole cycles, rounded up: a wait may run long, never short.
+    const std::uint64_t hz = *tckHz_;
+    std::uint64_t cycles = (microseconds * hz + 999'999) / 1'000'000;
+    std::uint64_t secondsLeft = microseconds;
+    do {
+        const std::uint64_t part = std::min(cycles, kMaxRunTestCycles);
+        const std::uint64_t partUs = cycles <= kMaxRunTestCycles ? secondsLeft : part * 1'000'000 / hz;
+        buffer_ += "RUNTEST " + std::to_string(part) + " TCK " + formatSvfSeconds(partUs) + " SEC;\n";
+        ++totals_.runTestCount;
+        cycles -= part;
+        secondsLeft -= std::min(secondsLeft, partUs);
+    } while (cycles > 0);
+}
+
 void SvfRecorder::writeSdr() {
-    const std::size_t bits = tdi_.size();
+    const BitBuffer* tdi = &tdi_;
+    const BitBuffer* tdo = &tdo_;
+    const BitBuffer* mask = &mask_;
+    if (bridge_ != nullptr) {
+        // The bridge frames the MOSI bits; what is compared moves to where
+        // the bridge returns MISO.
+        bridge_->encode(tdi_, compares_, dr_);
+        tdi = &dr_;
+        if (compares_) {
+            const std::size_t offset = bridge_->misoOffset();
+            for (auto [from, to] : {std::pair{&tdo_, &drTdo_}, std::pair{&mask_, &drMask_}}) {
+                to->assign(dr_.size(), false);
+                ports::copyBits(to->data(), offset, from->data(), 0, std::min(from->size(), dr_.size() - offset));
+            }
+            tdo = &drTdo_;
+            mask = &drMask_;
+        }
+    }
+    const std::size_t bits = tdi->size();
     buffer_ += "SDR ";
     buffer_ += std::to_string(bits);
     buffer_ += " TDI (";
-    appendSvfHex(buffer_, tdi_.data(), bits, kDigitsPerLine);
+    appendSvfHex(buffer_, tdi->data(), bits, kDigitsPerLine);
     buffer_ += ')';
     if (compares_) {
         buffer_ += " TDO (";
-        appendSvfHex(buffer_, tdo_.data(), bits, kDigitsPerLine);
+        appendSvfHex(buffer_, tdo->data(), bits, kDigitsPerLine);
         buffer_ += ") MASK (";
-        appendSvfHex(buffer_, mask_.data(), bits, kDigitsPerLine);
+        appendSvfHex(buffer_, mask->data(), bits, kDigitsPerLine);
         buffer_ += ')';
     }
     buffer_ += ";\n";
@@ -248,7 +322,7 @@ void SvfRecorder::flushBuffer() {
 
 void SvfRecorder::finish() {
     if (finished_) throw SvfError("'" + target().string() + "' is already finished");
-    closeTransaction();
+    framer_.closeOpenTransaction();
     flushBuffer();
     finished_ = true;
     std::string error;

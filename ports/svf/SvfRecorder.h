@@ -12,15 +12,23 @@
 #include "host/RLBitVec.h"
 #include "host/ScanPort.h"
 #include "host/AtomicOutputFile.h"
+#include "ports/jtag/Bridge.h"
 #include "ports/svf/BitBuffer.h"
+#include "ports/wire/TransactionFramer.h"
 
 #include <atomic>
 #include <cstdint>
 #include <filesystem>
+#include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
 namespace vorant::svf {
+
+// The header comment of a bridge recording that names its bridge as port
+// keys: "// Bridge: bridge=jtagspi,ir=0x2,irlen=6".
+inline constexpr const char* kBridgeLinePrefix = "// Bridge: ";
 
 struct SvfRecorderOptions {
     // Named in the header comments when not empty.
@@ -32,6 +40,17 @@ struct SvfRecorderOptions {
     // Lines written as they are after the set-up statements, for example an
     // SIR that selects the user's SPI bridge.
     std::vector<std::string> preamble;
+    // The JTAG-to-SPI bridge the recording is for: its instruction is
+    // selected once after the set-up (with the other TAPs of the chain in
+    // BYPASS through HIR/TIR/HDR/TDR), and each transaction becomes its DR
+    // scan. Null: the ideal bridge of the first format (no SIR, TDO at the
+    // SPI bits).
+    std::shared_ptr<const ports::jtag::Bridge> bridge;
+    ports::jtag::BridgeSettings bridgeSettings;
+    // With a TCK frequency every wait states its TCK cycles as well as its
+    // seconds, so it holds on a board that counts clocks. A wait longer than
+    // 2^31 - 1 cycles is split, as players read the count into an int.
+    std::optional<std::uint32_t> tckHz;
 };
 
 struct SvfRecorderTotals {
@@ -42,7 +61,7 @@ struct SvfRecorderTotals {
     std::uint64_t commentCount = 0;
 };
 
-class SvfRecorder final : public ScanPort {
+class SvfRecorder final : public ScanPort, private ports::TransactionSink {
 public:
     // Opens the temporary file and writes the header. Throws SvfError naming
     // the file when it cannot be written; nothing is created then.
@@ -89,30 +108,40 @@ public:
 
     // Hex digits per line of a wrapped value.
     static constexpr std::size_t kDigitsPerLine = 128;
+    // The most TCK cycles one RUNTEST states.
+    static constexpr std::uint64_t kMaxRunTestCycles = 0x7FFFFFFF;
 
 private:
     bool usable() const { return !finished_ && !file_.failed(); }
     void writeHeader(const SvfRecorderOptions& options);
-    void addShift(const RLBitVec& tdi, const RLBitVec* tdo, const RLBitVec* tdoMask);
-    void closeTransaction();
+    // --- ports::TransactionSink: a transaction is joined into one SDR ---
+    void select() override;
+    void shiftBits(const RLBitVec& tdi, RLBitVec* tdo, const RLBitVec* tdoMask, bool capture) override;
+    void deselect() override;
     void writeSdr();
+    void writeRunTest(std::uint64_t microseconds);
+    void writeBridgeSelection(const SvfRecorderOptions& options);
     void writeCommentLines(const char* text);
     void flushIfFull();
     void flushBuffer();
 
     vorant::AtomicOutputFile file_;
     std::string buffer_;
+    ports::TransactionFramer framer_{*this};
     // The transaction being joined. tdo_ and mask_ are only kept once a
     // shift of it has a mask bit set (compares_).
-    bool open_ = false;
     bool compares_ = false;
     BitBuffer tdi_, tdo_, mask_;
+    std::shared_ptr<const ports::jtag::Bridge> bridge_;
+    std::optional<std::uint32_t> tckHz_;
+    BitBuffer dr_, drTdo_, drMask_;  // the DR scan of a transaction
     // Comments that arrive while a transaction is open follow its SDR.
     std::string heldComments_;
     std::atomic<bool> cancelRequested_{false};
     bool finished_ = false;
     SvfRecorderTotals totals_;
     std::string failureReason_;
+    std::string refusal_;  // why the last refused shift or wait was refused
 };
 
 }  // namespace vorant::svf

@@ -1,12 +1,12 @@
-#include "cli/FlashFileAdvice.h"
+#include "ports/sim/FlashFileAdvice.h"
 
 #include "ports/sim/FlashFileError.h"
 
-namespace vorant::cli {
+namespace vorant::sim {
 
 std::string flashFileAdvice(const std::exception& problem) {
-    using Kind = sim::FlashFileError::Kind;
-    const auto* fileError = dynamic_cast<const sim::FlashFileError*>(&problem);
+    using Kind = FlashFileError::Kind;
+    const auto* fileError = dynamic_cast<const FlashFileError*>(&problem);
     const Kind kind = fileError ? fileError->kind() : Kind::Unusable;
     switch (kind) {
     case Kind::Truncated: return "remove it to start again from an erased flash, or give a new file name";
@@ -17,4 +17,4 @@ std::string flashFileAdvice(const std::exception& problem) {
     return "use a flash file made for this chip, or a new file name";
 }
 
-}  // namespace vorant::cli
+}  // namespace vorant::sim

@@ -1,0 +1,7 @@
+#include "ports/Port.h"
+
+namespace vorant::ports {
+
+Port::~Port() = default;
+
+}  // namespace vorant::ports
