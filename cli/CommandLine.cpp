@@ -79,6 +79,7 @@ struct ParsedValues {
     std::string format;
     bool dataWidthGiven = false, clockGiven = false, offsetGiven = false;
     bool debug = false, quiet = false, version = false, force = false;
+    bool noErase = false, noVerify = false, eraseWholeBlocks = false;
     std::vector<std::string> simFaults;
     // Every key of the port table's rows, also accepted as --KEY VALUE.
     std::map<std::string, std::string> portKeys;
@@ -118,6 +119,11 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
         ->type_name("bin|ihex|srec");
     app.add_flag("--force", values.force,
                  "Write to a chip whose JEDEC ID is not the part's (the check before every write is skipped)");
+    app.add_flag("--no-erase", values.noErase, "program: erase nothing, write the image's pages as they are");
+    app.add_flag("--no-verify", values.noVerify, "program: do not read the image back");
+    app.add_flag("--erase-whole-blocks", values.eraseWholeBlocks,
+                 "program into a recording: erase blocks the image covers only in part (a recording cannot keep "
+                 "their other bytes)");
     app.add_flag("--debug", values.debug, "Show debug traces");
     app.add_flag("--quiet", values.quiet, "Show only errors: no status lines, progress or summary");
     // The ports' own keys: the tool knows them only from the port table.
@@ -217,6 +223,9 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.debug = values.debug;
     options.quiet = values.quiet;
     options.force = values.force;
+    options.noErase = values.noErase;
+    options.noVerify = values.noVerify;
+    options.eraseWholeBlocks = values.eraseWholeBlocks;
     options.simFaults = values.simFaults;
     return options;
 }

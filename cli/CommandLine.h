@@ -26,6 +26,9 @@ struct ToolOptions {
     bool debug = false;
     bool quiet = false;
     bool force = false;  // write to a chip that answers another ID
+    // program: no erase at all, no verify, and (for a recording) erase
+    // blocks the image covers only in part.
+    bool noErase = false, noVerify = false, eraseWholeBlocks = false;
     std::vector<std::string> simFaults;
     formats::ImageOptions image;  // --format and --offset
 

@@ -137,7 +137,32 @@ ProgressPlan progressPlan(Type1SPIDevice& device, const OperationInfo& info, UT_
     return plan;
 }
 
-bool invoke(Type1SPIDevice& device, const OperationRequest& request, UT_CMDARGS& args, int index) {
+bool hasSwitch(const OperationRequest& request, std::initializer_list<const char*> names) {
+    for (const char* name : names)
+        if (std::find(request.switchTokens.begin(), request.switchTokens.end(), name) != request.switchTokens.end())
+            return true;
+    return false;
+}
+
+// program erases the blocks the image covers and writes them, unless -e
+// asks for the whole-chip erase (and every page from address 0) or
+// --no-erase for no erase at all; either way it verifies unless told not to.
+bool programsBlocks(const OperationRequest& request, const ToolOptions& options) {
+    return request.info->operation == Operation::Program && !options.noErase && !hasSwitch(request, {"-e", "-erase"});
+}
+
+UT_CMDARGS deviceArguments(const OperationRequest& request, const ToolOptions& options) {
+    if (request.info->operation != Operation::Program) return request.deviceArguments();
+    std::vector<std::string> tokens = request.operands;
+    tokens.insert(tokens.end(), request.switchTokens.begin(), request.switchTokens.end());
+    if (!options.noVerify && !hasSwitch(request, {"-v", "-verify"})) tokens.push_back("-v");
+    if (options.eraseWholeBlocks) tokens.push_back("-wholeblocks");
+    return UT_CMDARGS(tokens);
+}
+
+bool invoke(Type1SPIDevice& device, const OperationRequest& request, const ToolOptions& options, UT_CMDARGS& args,
+            int index) {
+    if (programsBlocks(request, options)) return device.programBlocks(index, &args);
     DeviceOperation& operations = device;  // the virtual operations, as any host drives them
     switch (request.info->operation) {
     case Operation::Program: return operations.program(index, &args);
@@ -348,7 +373,7 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     device.setCifReader(&cif);
     if (options.dataWidth)
         device.setAttribute(DeviceNS::ATTR_DATA_WIDTH, std::to_string(*options.dataWidth).c_str(), true);
-    UT_CMDARGS args = request.deviceArguments();
+    UT_CMDARGS args = deviceArguments(request, options);
 
     // Without polling nothing on the cable proves that a page or an erase
     // finished: say so before the run, not after it.
@@ -362,7 +387,11 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     if (options.quiet && answers) sink.setQuiet(false);
 
     CancelSignal cancelSignal;
-    ProgressPort progressPort(run.session->port(), progressPlan(device, info, args, run.part, run.image.get()),
+    ProgressPlan plan = progressPlan(device, info, args, run.part, run.image.get());
+    // Block by block, how many pages are read and written depends on what
+    // the chip holds: a spinner, not a bar that lies.
+    if (programsBlocks(request, options)) plan.totalSteps = 0;
+    ProgressPort progressPort(run.session->port(), plan,
                               &CancelSignal::flag());
     progressPort.setPhaseClock(run.session->phaseClock());
     device.setScanPort(&progressPort);
@@ -379,7 +408,7 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     const auto started = std::chrono::steady_clock::now();
     bool result = false;
     try {
-        result = invoke(device, request, args, options.index);
+        result = invoke(device, request, options, args, options.index);
     } catch (const std::exception& error) {
         toolError(std::string("the operation stopped: ") + error.what());
         result = false;

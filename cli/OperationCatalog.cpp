@@ -12,7 +12,7 @@ std::vector<OperationInfo> buildCatalog() {
     using K = OperandKind;
     return {
         {O::Program, "program", "program FILE [-e|-erase] [-v|-verify] [-qebit]",
-         "write FILE (binary, Intel HEX or S-records) where its addresses say; -e erases first, -v verifies after",
+         "write FILE (binary, Intel HEX or S-records) where its addresses say, erasing and rewriting only the blocks it covers, then verify; -e erases the whole chip first",
          K::ImageFile, {kErase, kEraseLong, kVerify, kVerifyLong, kQeBit}, true, true, "program"},
         {O::Verify, "verify", "verify FILE [-v|-verify]",
          "compare the flash with FILE (-v: without the status display)", K::ImageFile,

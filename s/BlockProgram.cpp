@@ -100,6 +100,19 @@ bool Type1SPIDevice::programBlocks(int index, UT_CMDARGS* args) {
     std::vector<std::uint32_t> sizes;
     for (const auto& type : types) sizes.push_back(type.sizeBytes);
     const std::vector<vorant::device::EraseStep> plan = vorant::device::planErase(spans, sizes, flashBytes);
+    // A recording cannot read a block to keep what lies around the data:
+    // it erases whole blocks only where that was accepted.
+    if (fileMode && !switchGiven(args, "-wholeblocks")) {
+        const auto partial =
+            vorant::device::partlyCoveredBlocks(spans, *std::min_element(sizes.begin(), sizes.end()), flashBytes);
+        if (!partial.empty()) {
+            DEVICE_MESSAGE().issueError(
+                "'%d': Programming terminated, the data cover the block at address 0x%llX only in part, and a "
+                "recording cannot read the rest of it to keep it.\n",
+                index, static_cast<unsigned long long>(partial.front().begin));
+            return false;
+        }
+    }
 
     bool result = true;
     if (useUnlockSr_) result = unlockStatusRegister(index, args);

@@ -60,7 +60,9 @@ public:
     // with the largest erase that fits and rewritten with the data and the
     // bytes around them it held; pages that end up all 0xFF are not sent.
     // "-v"/"-verify" reads every rewritten block back. In file mode nothing
-    // can be read: every block is erased and only the data are written.
+    // can be read: every block is erased and only the data are written, so
+    // data that cover a block only in part are refused unless
+    // "-wholeblocks" accepts that the rest of such blocks is erased.
     virtual bool programBlocks(int index, UT_CMDARGS* args);
 
     bool displayStatusRegisterBits(int index);

@@ -20,7 +20,7 @@ TEST_F(ToolTest, AFailedPollCountsAsBusy) {
     const Args slow{"--parts", "slow.toml", "--part", "SLOW16", "--port", "sim:flash.sim"};
     // Shift 8 is the first poll of page 1: after the ID read (1, 2), the
     // unlock (3, 4, 5), the page's write enable (6) and program (7).
-    const Result result = run(slow + Args{"--sim-fault", "fail-shift=8", "program", "image.bin"});
+    const Result result = run(slow + Args{"--sim-fault", "fail-shift=8", "--no-erase", "program", "image.bin"});
     EXPECT_EQ(result.status, 0) << result.text();
     EXPECT_TRUE(flashBytes(read("flash.sim")).substr(0, image.size()) == image) << "a page went to a busy chip";
 }
@@ -31,7 +31,7 @@ TEST_F(ToolTest, ALostCableStopsPollingAtOnce) {
     write("slow.toml", userPart("SLOW16", "EF4015", {{"PROGRAM_WAITTIME", "100"}, {"SIM_PAGE_PROGRAM_US", "400"}}));
     write("image.bin", randomBytes(1024, 3));
     const Result result = run(Args{"--parts", "slow.toml", "--part", "SLOW16", "--sim-fault", "disconnect=8",
-                                   "program", "image.bin"});
+                                   "--no-erase", "program", "image.bin"});
     EXPECT_EQ(result.status, 1);
     EXPECT_TRUE(has(result.err, "the connection to the device was lost")) << result.text();
     EXPECT_TRUE(has(result.err, "unplugged")) << result.text();

@@ -66,5 +66,27 @@ TEST_F(ToolTest, ImageMisuseIsRefusedBeforeAnyScan) {
     }
 }
 
+// program without -e touches only the blocks the image covers: what lies
+// around the image survives, and the run verifies by default.
+TEST_F(ToolTest, ProgramKeepsWhatTheImageDoesNotCover) {
+    const std::string boot = randomBytes(0x1000, 41), app = randomBytes(3000, 42), tail = randomBytes(100, 43);
+    write("boot.bin", boot);
+    write("app.bin", app);
+    write("tail.bin", tail);
+    ok(kSim + Args{"program", "boot.bin", "-e"});
+    const Result result = ok(kSim + Args{"--offset", "0x10000", "program", "app.bin"});
+    EXPECT_TRUE(has(result.out, "'0': Verification completed.")) << result.text();
+    EXPECT_TRUE(has(result.out, "1 block erased")) << result.text();
+    // 100 bytes in the middle of the block the app ends in: the app's last
+    // bytes before them and the erased bytes after them stay.
+    ok(kSim + Args{"--offset", "0x10C00", "program", "tail.bin"});
+    ok(kSim + Args{"readback", "-f", "out.bin"});
+    std::string expected = std::string(kSimBytes, '\xff').replace(0, boot.size(), boot);
+    expected.replace(0x10000, app.size(), app).replace(0x10C00, tail.size(), tail);
+    EXPECT_TRUE(read("out.bin") == expected);
+    // The same image again changes nothing: no block is erased.
+    EXPECT_TRUE(has(ok(kSim + Args{"--offset", "0x10000", "program", "app.bin"}).out, "0 blocks erased"));
+}
+
 }  // namespace
 }  // namespace vorant::cli::test

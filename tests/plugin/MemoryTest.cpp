@@ -199,9 +199,10 @@ TEST_P(Memory, Program) {
 }
 
 // Block programming in file mode: nothing can be read, so every block the
-// data touch is erased (with its longest wait) and only the pages holding
-// data are written; "-v" records reads that compare with what each block
-// should hold. The tiny part gets 16-byte sectors and 32-byte blocks.
+// data touch is erased (with its longest wait), only where "-wholeblocks"
+// accepts it for blocks covered in part, and only the pages holding data
+// are written; "-v" records reads that compare with what each block should
+// hold. The tiny part gets 16-byte sectors and 32-byte blocks.
 TEST_P(Memory, ProgramBlocks) {
     const Properties blocks = {{"SECTOR_SIZE", "16"}, {"SECTORERASE_MAXWAITTIME", "600"},
                                {"BLOCKERASE32_INSTRUCTION", "01010010"}, {"BLOCKERASE32_SIZE", "32"},
@@ -222,12 +223,18 @@ TEST_P(Memory, ProgramBlocks) {
         {.name = "20 bytes: one 32-byte block, three pages", .run = run, .stream = concat({written, writeDisable()}),
          .script = kFile, .changes = blocks,
          .status = {start, "'0': 1 block erased, 3 pages written, 0 blocks held the data already.\n", x1},
+         .tokens = {"-wholeblocks"}, .dataBytes = 20},
+        // The rest of a block the data cover in part cannot be read to keep it.
+        {.name = "a block covered in part", .run = run, .result = 0, .stream = kNoScan, .script = kFile,
+         .changes = blocks,
+         .errors = {"'0': Programming terminated, the data cover the block at address 0x10 only in part, and a "
+                    "recording cannot read the rest of it to keep it.\n"},
          .dataBytes = 20},
         {.name = "-v records reads that compare", .run = run, .stream = concat({verified, writeDisable()}),
          .script = kFile, .changes = blocks,
          .status = {start, "'0': 1 block erased, 3 pages written, 0 blocks held the data already.\n",
                     "'0': Verification completed.\n", x1},
-         .tokens = {"-v"}, .dataBytes = 20},
+         .tokens = {"-v", "-wholeblocks"}, .dataBytes = 20},
         {.name = "no erase smaller than the chip", .run = run, .result = 0, .stream = kNoScan, .script = kFile,
          .changes = {{"SECTOR_SIZE", kAbsent}},
          .errors = {"'0': Programming terminated, the part names no erase smaller than the chip "
