@@ -42,7 +42,8 @@ std::string operationsHelp() {
             "    1. $VORANT_PARTS_DIR (when set, it must be a folder),\n"
             "    2. the folder 'parts' beside the vorant-spi executable,\n"
             "    3. the source tree's parts folder it was built from,\n"
-            "  then every --parts FILE, in order (a later part of the same name wins).\n"
+            "  then every --parts FILE or FOLDER (its *.toml files), in order; a later\n"
+            "  part of the same name wins, with a notice. Part names ignore letter case.\n"
             "  --part auto reads the JEDEC ID and picks the one part that has it; the\n"
             "  simulator then plays --chip, by default "
          << kDefaultSimulatedChip
@@ -96,8 +97,8 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
                    "The part the simulator plays (default: --part, or " + std::string(kDefaultSimulatedChip) +
                        " with --part auto)")
         ->type_name("NAME");
-    app.add_option("--parts", values.partFiles, "Load extra part files after the shipped ones (repeatable)")
-        ->type_name("FILE")
+    app.add_option("--parts", values.partFiles, "Load extra part files (a file, or a folder of *.toml) after the shipped ones (repeatable)")
+        ->type_name("FILE|DIR")
         ->expected(1)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--index", values.index, "The device's position, as shown in messages (default: 0)")

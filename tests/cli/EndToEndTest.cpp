@@ -125,5 +125,17 @@ TEST_F(ToolTest, UserPartWithAnUnusualPageSizeWorksWithoutRebuilding) {
     EXPECT_TRUE(read("out.bin") == flashWith(image));
 }
 
+TEST_F(ToolTest, AFolderOfUserPartsLoadsAndAReplacedPartIsAnnounced) {
+    fs::create_directories(dir / "mine");
+    write("mine/a.toml", userPart("my_flash_a", "EF40AB"));
+    // Same name as a shipped part in another letter case: it replaces it.
+    write("mine/b.toml", userPart("w25q16jv", "EF4015", {{"DEVICE_SIZE", "16777216"}}));
+    const Result result = ok({"--parts", "mine", "--chip", "My_Flash_A", "--part", "MY_FLASH_A", "--port",
+                              "sim:flash.bin", "idcode"});
+    EXPECT_TRUE(has(result.out, "INFO: part w25q16jv from ")) << result.text();
+    EXPECT_TRUE(has(result.out, "replaces the one from ")) << result.text();
+    EXPECT_TRUE(has(result.out, "EF40AB")) << result.text();
+}
+
 }  // namespace
 }  // namespace vorant::cli::test
