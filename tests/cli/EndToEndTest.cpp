@@ -25,7 +25,9 @@ INSTANTIATE_TEST_SUITE_P(ShippedParts, AutoPart, ::testing::Values(
     AutoCase{"W25Q16JV", "idcode", 0, "Identified W25Q16JV by its JEDEC ID EF4015.", "IDCODE is 'EF4015'"},
     // A part that identifies itself with RES: its device reads the signature.
     AutoCase{"M25P16", "signature", 0, "Identified M25P16 by its JEDEC ID 202015.", "IDCODE is '14'"},
-    AutoCase{"MX25L3233F", "idcode", 0, "Identified MX25L3233F by its JEDEC ID C22016.", "IDCODE is 'C22016'"},
+    AutoCase{"MX25L1606E", "idcode", 0, "Identified MX25L1606E by its JEDEC ID C22015.", "IDCODE is 'C22015'"},
+    // Two generations answer C22016 and differ in Quad Enable: both are named.
+    AutoCase{"MX25L3233F", "idcode", 2, "(MX25L3206E, MX25L3233F); choose one with --part NAME", "C22016"},
     AutoCase{"S25FL064L", "idcode", 0, "Identified S25FL064L by its JEDEC ID 016017.", "IDCODE is '016017'"},
     // Two parts answer 20BA18: the tool names both and wants --part.
     AutoCase{"N25Q128A", "idcode", 2, "(MT25QL128ABA, N25Q128A); choose one with --part NAME", "20BA18"}));
