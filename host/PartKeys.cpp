@@ -16,7 +16,7 @@ namespace {
 // Keys besides the ones a device reads: identification, the simulator's
 // chip facts, the erase granularities and the status-bit labels.
 const char* const kDescriptiveKeys[] = {
-    "extends", "VENDOR", "DESCRIPTION", "SOURCE", "JEDEC_ID", "RES_SIGNATURE", "QE_LOCATION", "WRSR_BITS",
+    "extends", "VENDOR", "DESCRIPTION", "SOURCE", "JEDEC_ID", "RES_SIGNATURE", "QE_LOCATION", "WRSR_BITS", "SFDP",
     "SECTOR_SIZE", "SECTORERASE_MAXWAITTIME", "SECTORERASE_WAITTIME_INC",
     "BLOCKERASE32_INSTRUCTION", "BLOCKERASE32_SIZE", "BLOCKERASE32_WAITTIME", "BLOCKERASE32_MAXWAITTIME",
     "BLOCKERASE32_WAITTIME_INC",

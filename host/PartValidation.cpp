@@ -173,6 +173,9 @@ public:
             const std::string& qe = text("QE_LOCATION");
             if (qe != "SR2.1" && qe != "SR1.6" && qe != "none") fail("QE_LOCATION", "must be SR2.1, SR1.6 or none");
         }
+        if (has("SFDP") && text("SFDP") != "none" &&
+            (!isHexText(text("SFDP")) || text("SFDP").size() % 2 != 0 || text("SFDP").size() < 16))
+            fail("SFDP", "must be the SFDP area as hexadecimal digits (two per byte), or none");
         if (has("WRSR_BITS") && number("WRSR_BITS") != 8 && number("WRSR_BITS") != 16)
             fail("WRSR_BITS", "must be 8 or 16");
         for (const char* erase : kEraseGranularities) checkEraseGranularity(erase);

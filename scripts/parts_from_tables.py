@@ -69,7 +69,22 @@ VENDOR_FILES = {
 
 # Keys that name one chip: never written into a family, even when a family
 # has a single part.
-IDENTITY_KEYS = {"JEDEC_ID", "IDCODE", "RES_SIGNATURE", "DEVICE_SIZE"}
+IDENTITY_KEYS = {"JEDEC_ID", "IDCODE", "RES_SIGNATURE", "DEVICE_SIZE", "SFDP"}
+
+# Parts whose SFDP area, read from a real chip, is in tests/data/sfdp (part ->
+# dump name); the simulator serves it instead of one written from the keys.
+SFDP_DUMPS = {"W25Q64JW-IM": "W25Q64JWM", "W25Q512NW-IM": "W25Q512NW-IM", "MX25U25645G": "MX25U25645G",
+              "IS25WP256": "IS25WP256", "N25Q064A": "N25Q064A"}
+# Generations older than SFDP: their simulated chips ignore 5Ah.
+NO_SFDP = re.compile(r"^(W25X|M25P|AT25DF|EN25F|EN25Q\d|F25L|MX25L\d+0[56]E)")
+SFDP_FOLDER = os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", "tests", "data", "sfdp")
+
+
+def sfdp_value(part):
+    if part in SFDP_DUMPS:
+        with open(os.path.join(SFDP_FOLDER, SFDP_DUMPS[part] + ".sfdp.hex"), encoding="ascii") as handle:
+            return "".join(handle.read().split()).upper()
+    return "none" if NO_SFDP.search(part) else None
 
 HIDDEN_REGISTER_2 = ["NOT_VALID"] * 8
 WINBOND_REGISTER_1 = ["BUSY", "WEL", "BP0", "BP1", "BP2", "TB", "SEC", "SRP"]
@@ -271,6 +286,9 @@ def part_keys(row):
     add("X4_READ", "TRUE" if qe == "SR2.1" and wrsr_bits == 16 else "FALSE")
     add("STATUS_REGISTER_LENGTH", 16)
     low = has_low_confidence(row["source"])
+    sfdp = sfdp_value(row["part"])
+    if sfdp is not None:
+        add("SFDP", sfdp)
     add("SOURCE", source_summary(row["source"]) + ("; typical times estimated" if low else ""))
     return keys, capped, low
 

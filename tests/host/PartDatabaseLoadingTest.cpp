@@ -134,6 +134,8 @@ const BadPart kBadParts[] = {
     {"block size not a power of two", "BLOCKERASE32_SIZE = 30000\n", "BLOCKERASE32_SIZE"},
     {"block size past the chip", "BLOCKERASE64_SIZE = 33554432\n", "BLOCKERASE64_SIZE"},
     {"block opcode in hex", "BLOCKERASE32_INSTRUCTION = \"52\"\n", "BLOCKERASE32_INSTRUCTION"},
+    {"SFDP area not hexadecimal", "SFDP = \"5346445G05010000\"\n", "SFDP"},
+    {"SFDP area of half a byte", "SFDP = \"53464450050100FF0\"\n", "SFDP"},
     {"zero block polling step", "BLOCKERASE32_WAITTIME_INC = 0\n", "BLOCKERASE32_WAITTIME_INC"},
 };
 INSTANTIATE_TEST_SUITE_P(Validation, InvalidParts, ::testing::ValuesIn(kBadParts));
