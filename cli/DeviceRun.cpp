@@ -11,6 +11,7 @@
 #include "cli/ProgressDisplay.h"
 #include "cli/ProgressPort.h"
 #include "cli/RunRefused.h"
+#include "cli/SfdpOperation.h"
 #include "cli/RunSummary.h"
 #include "cli/SameFile.h"
 #include "cli/SvfPlayback.h"
@@ -149,6 +150,7 @@ bool invoke(Type1SPIDevice& device, const OperationRequest& request, UT_CMDARGS&
     // The two operations outside the table of virtual operations.
     case Operation::Unlock: return device.unlockStatusRegister(index, &args);
     case Operation::QuadEnable: return device.writeQuadEnableBit(index, &args, request.operands.at(0) == "set");
+    case Operation::Sfdp: return showSfdp(*device.getScanPort());  // the tool reads it, not the plug-in
     case Operation::Parts:
     case Operation::Play: break;
     }
@@ -266,7 +268,8 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
         throw;
     }
     if (identification)
-        toolInfo("Identified " + run.part + " by its JEDEC ID " + identification->jedecId + ".");
+        toolInfo("Identified " + run.part + " by its JEDEC ID " + identification->jedecId +
+                 (identification->decidedBy.empty() ? "" : " and " + identification->decidedBy) + ".");
     return run;
 }
 

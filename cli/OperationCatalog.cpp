@@ -40,6 +40,8 @@ std::vector<OperationInfo> buildCatalog() {
         {O::Unlock, "unlock", "unlock", "clear the block-protect bits", K::None, {}, true, true, ""},
         {O::QuadEnable, "qe", "qe set|clear", "set or clear Quad Enable (parts with X4_READ only)", K::QeMode, {}, true,
          true, ""},
+        {O::Sfdp, "sfdp", "sfdp", "read the chip's SFDP table (5Ah) and show it decoded", K::None, {}, true, false,
+         ""},
         {O::Parts, "parts", "parts [PATTERN]",
          "list the part database (PATTERN: '*' and '?' wildcards, any case)", K::OptionalPattern, {},
          false, false, ""},

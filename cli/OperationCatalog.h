@@ -7,7 +7,7 @@ namespace vorant::cli {
 
 enum class Operation {
     Program, Verify, Checksum, Erase, BlankCheck, Readback, IdCode, Signature,
-    Validate, Status, Release, Unlock, QuadEnable, Parts, Play,
+    Validate, Status, Release, Unlock, QuadEnable, Sfdp, Parts, Play,
 };
 
 // What an operation takes besides its switches.

@@ -26,8 +26,14 @@ INSTANTIATE_TEST_SUITE_P(ShippedParts, AutoPart, ::testing::Values(
     // A part that identifies itself with RES: its device reads the signature.
     AutoCase{"M25P16", "signature", 0, "Identified M25P16 by its JEDEC ID 202015.", "IDCODE is '14'"},
     AutoCase{"MX25L1606E", "idcode", 0, "Identified MX25L1606E by its JEDEC ID C22015.", "IDCODE is 'C22015'"},
-    // Two generations answer C22016 and differ in Quad Enable: both are named.
-    AutoCase{"MX25L3233F", "idcode", 2, "(MX25L3206E, MX25L3233F); choose one with --part NAME", "C22016"},
+    // Two generations answer C22016; SFDP tells them apart: the newer one
+    // publishes a table, the older one none.
+    AutoCase{"MX25L3233F", "idcode", 0, "Identified MX25L3233F by its JEDEC ID C22016 and its SFDP table",
+             "IDCODE is 'C22016'"},
+    AutoCase{"MX25L3206E", "idcode", 0, "Identified MX25L3206E by its JEDEC ID C22016 and its missing SFDP table",
+             "IDCODE is 'C22016'"},
+    // EF4018 is shared by parts whose tables fit both alike: both are named.
+    AutoCase{"W25Q128JV", "idcode", 2, "(W25Q128FV, W25Q128JV); choose one with --part NAME", "EF4018"},
     AutoCase{"S25FL064L", "idcode", 0, "Identified S25FL064L by its JEDEC ID 016017.", "IDCODE is '016017'"},
     // Two parts answer 20BA18: the tool names both and wants --part.
     AutoCase{"N25Q128A", "idcode", 2, "(MT25QL128ABA, N25Q128A); choose one with --part NAME", "20BA18"}));
@@ -125,6 +131,21 @@ TEST_F(ToolTest, UserPartWithAnUnusualPageSizeWorksWithoutRebuilding) {
     EXPECT_TRUE(has(ok(port + Args{"program", "image.bin", "-e", "-v"}).out, "Identified MY_FLASH_P128"));
     ok(port + Args{"readback", "-f", "out.bin"});
     EXPECT_TRUE(read("out.bin") == flashWith(image));
+}
+
+TEST_F(ToolTest, SfdpShowsTheChipsTableDecodedOrSaysItHasNone) {
+    // The simulated W25Q128JV serves the area read from a real chip.
+    const Result real = ok({"--part", "W25Q128JV", "--chip", "W25Q128JV", "sfdp"});
+    for (const char* line : {"SFDP revision 1.5, 1 parameter table", "Density: 16777216 bytes",
+                             "Erase type 2: 32768 bytes, opcode 52h, typical 128 ms, maximum 1792 ms",
+                             "Page: 256 bytes, program typical 704 us", "(requirement 4)"})
+        EXPECT_TRUE(has(real.out, line)) << line << "\n" << real.text();
+    const Result old = run({"--chip", "M25P16", "sfdp"});
+    EXPECT_EQ(old.status, 1) << old.text();
+    EXPECT_TRUE(has(old.err, "the chip's SFDP area cannot be used: no SFDP signature")) << old.text();
+    const Result recording = run({"--part", "W25Q16JV", "--port", "svf:job.svf", "sfdp"});
+    EXPECT_EQ(recording.status, 2) << recording.text();
+    EXPECT_FALSE(fs::exists(dir / "job.svf"));
 }
 
 TEST_F(ToolTest, AFolderOfUserPartsLoadsAndAReplacedPartIsAnnounced) {
