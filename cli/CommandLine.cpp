@@ -133,14 +133,26 @@ struct SplitArguments {
     std::vector<std::string> operationTokens;
 };
 
+// A long switch the operation's row declares (parts --id) is the
+// operation's, not the tool's.
+bool operationDeclares(const std::string& operation, const std::string& token) {
+    const OperationInfo* info = findOperation(operation);
+    if (info == nullptr) return false;
+    for (const SwitchInfo& sw : info->switches)
+        if (sw.name == token) return true;
+    return false;
+}
+
 // Options before the operation are the tool's; after it, long options are
-// still the tool's and everything else belongs to the operation.
+// still the tool's (unless the operation declares them) and everything else
+// belongs to the operation.
 SplitArguments splitArguments(CLI::App& app, const std::vector<std::string>& arguments) {
     SplitArguments split;
     bool operationSeen = false;
     for (std::size_t i = 0; i < arguments.size(); ++i) {
         const std::string& token = arguments[i];
-        const bool global = operationSeen ? isLongOption(token) : (token.size() > 1 && token[0] == '-');
+        const bool global = operationSeen ? isLongOption(token) && !operationDeclares(split.operation, token)
+                                          : (token.size() > 1 && token[0] == '-');
         if (global) {
             split.global.push_back(token);
             if (consumesNextToken(app, token) && i + 1 < arguments.size()) split.global.push_back(arguments[++i]);

@@ -68,6 +68,8 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
             "backwards.toml: part TEST_BACKWARDS: PROGRAM_MAXWAITTIME: 300 is below PROGRAM_WAITTIME (400)"},
     BadCase{"PartFolderWithoutPartFiles", {"--parts", "noparts", "--part", "W25Q16JV", "erase"}, 2,
             "no part files (*.toml) in the folder"},
+    BadCase{"PartsSizeThatIsNoSize", {"parts", "--size", "16 parsecs"}, 2, "--size 16 parsecs is not a size"},
+    BadCase{"PartsIdWithoutValue", {"parts", "--id"}, 2, "'--id' needs a JEDEC ID such as EF4018"},
     BadCase{"RecordingIntoAMissingFolder", {"--part", "W25Q16JV", "--port", "svf:no/job.svf", "erase"}, 2,
             "no/job.svf"},
     BadCase{"RecordingNeedsAPartName", {"--port", "svf:job.svf", "program", "image.bin"}, 2, "--part NAME"},

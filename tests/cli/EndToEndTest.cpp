@@ -3,6 +3,9 @@
 // a file, Ctrl-C, parts users add, exit statuses.
 #include "ToolTestFixture.h"
 
+#include <set>
+#include <sstream>
+
 namespace vorant::cli::test {
 namespace {
 
@@ -146,6 +149,40 @@ TEST_F(ToolTest, SfdpShowsTheChipsTableDecodedOrSaysItHasNone) {
     const Result recording = run({"--part", "W25Q16JV", "--port", "svf:job.svf", "sfdp"});
     EXPECT_EQ(recording.status, 2) << recording.text();
     EXPECT_FALSE(fs::exists(dir / "job.svf"));
+}
+
+// The listing's first column, one name a line.
+std::vector<std::string> listedParts(const std::string& out) {
+    std::vector<std::string> names;
+    std::istringstream lines(out);
+    std::string line;
+    std::getline(lines, line);  // header
+    while (std::getline(lines, line)) names.push_back(line.substr(0, line.find(' ')));
+    return names;
+}
+
+TEST_F(ToolTest, PartsListsTwoHundredPartsOfTwelveMakersAndFilters) {
+    const Result all = ok({"parts"});
+    EXPECT_TRUE(has(all.out, "PART") && has(all.out, "VENDOR") && has(all.out, "SUPPORT") && has(all.out, "SOURCE"));
+    EXPECT_GE(listedParts(all.out).size(), 200u);
+    std::set<std::string> makers;
+    for (const char* maker : {"Winbond", "Macronix", "GigaDevice", "Micron", "ISSI", "Infineon", "Renesas", "XMC",
+                              "XTX", "Puya", "Zbit", "Boya", "Eon", "Fudan", "ESMT", "Zetta"})
+        if (has(all.out, std::string("  ") + maker)) makers.insert(maker);
+    EXPECT_GE(makers.size(), 12u);
+
+    const std::pair<Args, std::vector<std::string>> filters[] = {
+        {{"parts", "--id", "ef4018"}, {"W25Q128FV", "W25Q128JV"}},
+        {{"parts", "--vendor", "micron", "--size", "128Mbit"},
+         {"M25P128", "MT25QL128ABA", "MT25QU128ABA", "N25Q128A", "N25Q128A11"}},
+        {{"parts", "W25Q*JV", "--size", "32MiB"}, {"W25Q256JV"}},
+    };
+    for (const auto& [args, expected] : filters) EXPECT_EQ(listedParts(ok(args).out), expected) << args[1];
+    const std::string x4 = ok({"parts", "W25Q128JV"}).out;
+    EXPECT_TRUE(has(x4, "x4,unlock  reference table")) << x4;
+    const Result none = run({"parts", "--vendor", "nobody"});
+    EXPECT_EQ(none.status, 1);
+    EXPECT_TRUE(has(none.err, "no part matches '*' --vendor nobody")) << none.text();
 }
 
 TEST_F(ToolTest, AFolderOfUserPartsLoadsAndAReplacedPartIsAnnounced) {
