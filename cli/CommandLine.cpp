@@ -44,7 +44,9 @@ std::string operationsHelp() {
             "    3. the source tree's parts folder it was built from,\n"
             "  then every --parts FILE or FOLDER (its *.toml files), in order; a later\n"
             "  part of the same name wins, with a notice. Part names ignore letter case.\n"
-            "  --part auto reads the JEDEC ID and picks the one part that has it; the\n"
+            "  --part auto reads the JEDEC ID and picks the one part that has it (where\n"
+            "  several share it, the one the chip's SFDP table fits); --part sfdp builds\n"
+            "  a part from the chip's ID and SFDP table and prints it. The\n"
             "  simulator then plays --chip, by default "
          << kDefaultSimulatedChip
          << ".\n"
@@ -88,9 +90,9 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
     app.set_help_flag("-h,--help", "Show this help and exit");
     app.add_flag("--version", values.version, "Show the version and exit");
     app.add_option("--part", values.part,
-                   "The flash part, or 'auto' to identify it by its JEDEC ID (default: auto; the SVF port "
-                   "needs a name)")
-        ->type_name("NAME|auto");
+                   "The flash part, 'auto' to identify it by its JEDEC ID (and SFDP where the ID is shared), or "
+                   "'sfdp' to build it from the chip's SFDP table (default: auto; the SVF port needs a name)")
+        ->type_name("NAME|auto|sfdp");
     app.add_option("--port", values.port, "Where the scans go: sim, sim:FILE or svf:FILE (default: sim)")
         ->type_name("PORT");
     app.add_option("--chip", values.chip,
@@ -171,6 +173,7 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.part = values.part;
     if (options.part.empty()) throw UsageError("--part needs a part name or 'auto'");
     if (UT_STR::ICompare(options.part.c_str(), "auto") == 0) options.part = "auto";
+    if (UT_STR::ICompare(options.part.c_str(), "sfdp") == 0) options.part = "sfdp";
     options.port = parsePortChoice(values.port);
     if (!values.chip.empty()) options.chip = values.chip;
     options.partFiles = values.partFiles;

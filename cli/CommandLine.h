@@ -25,7 +25,10 @@ struct ToolOptions {
     bool quiet = false;
     std::vector<std::string> simFaults;
 
-    bool autoPart() const { return part == "auto"; }
+    // The part comes from the chip: by its ID (auto) or built from its SFDP
+    // table (sfdp).
+    bool autoPart() const { return part == "auto" || part == "sfdp"; }
+    bool sfdpPart() const { return part == "sfdp"; }
 };
 
 struct CommandLine {

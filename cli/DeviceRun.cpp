@@ -12,6 +12,7 @@
 #include "cli/ProgressPort.h"
 #include "cli/RunRefused.h"
 #include "cli/SfdpOperation.h"
+#include "cli/SfdpPart.h"
 #include "cli/RunSummary.h"
 #include "cli/SameFile.h"
 #include "cli/SvfPlayback.h"
@@ -253,7 +254,13 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
     std::optional<Identification> identification;
     try {
         if (options.autoPart()) {
-            identification = identifyPart(run.session->port(), options.index);
+            if (options.sfdpPart()) {
+                identification.emplace();
+                identification->partName = partFromChipSfdp(run.session->port(), identification->jedecId);
+                identification->decidedBy = "its SFDP table (the entry above)";
+            } else {
+                identification = identifyPart(run.session->port(), options.index);
+            }
             run.part = identification->partName;
             checkQuadEnableWritable(run.part, request);
             if (run.image) checkImageFits(*run.image, run.file, run.part);

@@ -185,6 +185,24 @@ TEST_F(ToolTest, PartsListsTwoHundredPartsOfTwelveMakersAndFilters) {
     EXPECT_TRUE(has(none.err, "no part matches '*' --vendor nobody")) << none.text();
 }
 
+TEST_F(ToolTest, PartSfdpBuildsAPartFromTheChipPrintsItAndProgramsWithIt) {
+    const std::string image = randomBytes(5001, 23);
+    write("image.bin", image);
+    const Result built = ok({"--part", "sfdp", "--chip", "W25Q64JV", "--port", "sim:flash.bin", "program", "image.bin",
+                             "-e", "-v"});
+    EXPECT_TRUE(has(built.out, "Identified SFDP_EF4017 by its JEDEC ID EF4017 and its SFDP table")) << built.text();
+    // The printed entry, saved as a file, loads and drives the same chip.
+    const auto from = built.out.find("# Built by"), to = built.out.find("INFO: Identified");
+    ASSERT_TRUE(from != std::string::npos && to != std::string::npos) << built.text();
+    write("saved.toml", built.out.substr(from, to - from));
+    ok({"--parts", "saved.toml", "--part", "sfdp_ef4017", "--chip", "W25Q64JV", "--port", "sim:flash.bin", "verify",
+        "image.bin"});
+    // A chip older than SFDP cannot describe itself.
+    const Result old = run({"--part", "sfdp", "--chip", "M25P16", "--port", "sim:old.bin", "program", "image.bin"});
+    EXPECT_EQ(old.status, 2) << old.text();
+    EXPECT_TRUE(has(old.err, "(JEDEC ID 202015) has no usable SFDP table (no SFDP signature")) << old.text();
+}
+
 TEST_F(ToolTest, AFolderOfUserPartsLoadsAndAReplacedPartIsAnnounced) {
     fs::create_directories(dir / "mine");
     write("mine/a.toml", userPart("my_flash_a", "EF40AB"));
