@@ -12,6 +12,7 @@
 #include <algorithm>
 #include <bitset>
 #include <climits>
+#include <cstdint>
 #include <sstream>
 
 namespace vorant::cli {
