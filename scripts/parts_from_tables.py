@@ -1,7 +1,8 @@
 #!/usr/bin/env python3
 """Writes part files from the tab-separated SPI NOR fact tables.
 
-    scripts/parts_from_tables.py TABLE.tsv [TABLE.tsv ...] --out parts/
+    scripts/parts_from_tables.py tests/data/parts/spi-nor-parts.tsv \
+        tests/data/parts/spi-nor-parts-more.tsv --out parts/
 
 Each row becomes one [part.NAME] table. Parts are grouped into families (one
 command set and status-register layout each); keys that every part of a
