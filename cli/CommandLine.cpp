@@ -39,8 +39,11 @@ std::string operationsHelp() {
             "    1. $VORANT_PARTS_DIR (when set, it must be a folder),\n"
             "    2. the folder 'parts' beside the vorant-spi executable,\n"
             "    3. the source tree's parts folder it was built from,\n"
-            "  then every --parts FILE, in order (a later part of the same name wins).\n"
-            "  --part auto reads the JEDEC ID and picks the one part that has it; the\n"
+            "  then every --parts FILE or FOLDER (its *.toml files), in order; a later\n"
+            "  part of the same name wins, with a notice. Part names ignore letter case.\n"
+            "  --part auto reads the JEDEC ID and picks the one part that has it (where\n"
+            "  several share it, the one the chip's SFDP table fits); --part sfdp builds\n"
+            "  a part from the chip's ID and SFDP table and prints it. The\n"
             "  simulator then plays --chip, by default "
          << kDefaultSimulatedChip
          << ".\n"
@@ -90,17 +93,17 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
     app.set_help_flag("-h,--help", "Show this help and exit");
     app.add_flag("--version", values.version, "Show the version and exit");
     app.add_option("--part", values.part,
-                   "The flash part, or 'auto' to identify it by its JEDEC ID (default: auto; the SVF port "
-                   "needs a name)")
-        ->type_name("NAME|auto");
+                   "The flash part, 'auto' to identify it by its JEDEC ID (and SFDP where the ID is shared), or "
+                   "'sfdp' to build it from the chip's SFDP table (default: auto; the SVF port needs a name)")
+        ->type_name("NAME|auto|sfdp");
     app.add_option("--port", values.port, "Where the scans go: " + ports::portNames() + " (default: sim; see Ports)")
         ->type_name("PORT");
     app.add_option("--chip", values.chip,
                    "The part the simulator plays (default: --part, or " + std::string(kDefaultSimulatedChip) +
                        " with --part auto)")
         ->type_name("NAME");
-    app.add_option("--parts", values.partFiles, "Load extra part files after the shipped ones (repeatable)")
-        ->type_name("FILE")
+    app.add_option("--parts", values.partFiles, "Load extra part files (a file, or a folder of *.toml) after the shipped ones (repeatable)")
+        ->type_name("FILE|DIR")
         ->expected(1)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--index", values.index, "The device's position, as shown in messages (default: 0)")
@@ -157,14 +160,26 @@ struct SplitArguments {
     std::vector<std::string> operationTokens;
 };
 
+// A long switch the operation's row declares (parts --id) is the
+// operation's, not the tool's.
+bool operationDeclares(const std::string& operation, const std::string& token) {
+    const OperationInfo* info = findOperation(operation);
+    if (info == nullptr) return false;
+    for (const SwitchInfo& sw : info->switches)
+        if (sw.name == token) return true;
+    return false;
+}
+
 // Options before the operation are the tool's; after it, long options are
-// still the tool's and everything else belongs to the operation.
+// still the tool's (unless the operation declares them) and everything else
+// belongs to the operation.
 SplitArguments splitArguments(CLI::App& app, const std::vector<std::string>& arguments) {
     SplitArguments split;
     bool operationSeen = false;
     for (std::size_t i = 0; i < arguments.size(); ++i) {
         const std::string& token = arguments[i];
-        const bool global = operationSeen ? isLongOption(token) : (token.size() > 1 && token[0] == '-');
+        const bool global = operationSeen ? isLongOption(token) && !operationDeclares(split.operation, token)
+                                          : (token.size() > 1 && token[0] == '-');
         if (global) {
             split.global.push_back(token);
             if (consumesNextToken(app, token) && i + 1 < arguments.size()) split.global.push_back(arguments[++i]);
@@ -183,6 +198,7 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.part = values.part;
     if (options.part.empty()) throw UsageError("--part needs a part name or 'auto'");
     if (UT_STR::ICompare(options.part.c_str(), "auto") == 0) options.part = "auto";
+    if (UT_STR::ICompare(options.part.c_str(), "sfdp") == 0) options.part = "sfdp";
     try {
         options.port = ports::parsePortAddress(values.port);
         const ports::PortInfo& row = *ports::findPort(options.port.kind);

@@ -32,7 +32,10 @@ struct ToolOptions {
     std::vector<std::string> simFaults;
     formats::ImageOptions image;  // --format and --offset
 
-    bool autoPart() const { return part == "auto"; }
+    // The part comes from the chip: by its ID (auto) or built from its SFDP
+    // table (sfdp).
+    bool autoPart() const { return part == "auto" || part == "sfdp"; }
+    bool sfdpPart() const { return part == "sfdp"; }
 };
 
 struct CommandLine {

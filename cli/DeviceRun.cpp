@@ -10,6 +10,8 @@
 #include "cli/ProgressAwareSink.h"
 #include "cli/ProgressDisplay.h"
 #include "cli/ProgressPort.h"
+#include "cli/SfdpOperation.h"
+#include "cli/SfdpPart.h"
 #include "cli/ToolFailure.h"
 #include "cli/RunSummary.h"
 #include "cli/SameFile.h"
@@ -179,6 +181,7 @@ bool invoke(Type1SPIDevice& device, const OperationRequest& request, const ToolO
     // The two operations outside the table of virtual operations.
     case Operation::Unlock: return device.unlockStatusRegister(index, &args);
     case Operation::QuadEnable: return device.writeQuadEnableBit(index, &args, request.operands.at(0) == "set");
+    case Operation::Sfdp: return showSfdp(*device.getScanPort());  // the tool reads it, not the plug-in
     case Operation::Parts:
     case Operation::Play: break;
     }
@@ -286,7 +289,13 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
     std::optional<Identification> identification;
     try {
         if (options.autoPart()) {
-            identification = identifyPart(run.session->port(), options.index);
+            if (options.sfdpPart()) {
+                identification.emplace();
+                identification->partName = partFromChipSfdp(run.session->port(), identification->jedecId);
+                identification->decidedBy = "its SFDP table (the entry above)";
+            } else {
+                identification = identifyPart(run.session->port(), options.index);
+            }
             run.part = identification->partName;
             checkQuadEnableWritable(run.part, request);
             if (run.image) checkImageFits(*run.image, run.file, run.part);
@@ -301,7 +310,8 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
         throw;
     }
     if (identification)
-        toolInfo("Identified " + run.part + " by its JEDEC ID " + identification->jedecId + ".");
+        toolInfo("Identified " + run.part + " by its JEDEC ID " + identification->jedecId +
+                 (identification->decidedBy.empty() ? "" : " and " + identification->decidedBy) + ".");
     return run;
 }
 

@@ -6,6 +6,9 @@ namespace {
 
 const SwitchInfo kErase{"-e"}, kEraseLong{"-erase"}, kVerify{"-v"}, kVerifyLong{"-verify"},
     kQeBit{"-qebit"}, kFile{"-f", true}, kFileLong{"-file", true};
+// Filters of the part list; long, as a user types them after 'parts'.
+const SwitchInfo kVendor{"--vendor", true, "a vendor name"}, kSize{"--size", true, "a size such as 16MiB"},
+    kId{"--id", true, "a JEDEC ID such as EF4018"};
 
 std::vector<OperationInfo> buildCatalog() {
     using O = Operation;
@@ -40,8 +43,11 @@ std::vector<OperationInfo> buildCatalog() {
         {O::Unlock, "unlock", "unlock", "clear the block-protect bits", K::None, {}, true, true, ""},
         {O::QuadEnable, "qe", "qe set|clear", "set or clear Quad Enable (parts with X4_READ only)", K::QeMode, {}, true,
          true, ""},
-        {O::Parts, "parts", "parts [PATTERN]",
-         "list the part database (PATTERN: '*' and '?' wildcards, any case)", K::OptionalPattern, {},
+        {O::Sfdp, "sfdp", "sfdp", "read the chip's SFDP table (5Ah) and show it decoded", K::None, {}, true, false,
+         ""},
+        {O::Parts, "parts", "parts [PATTERN] [--vendor NAME] [--size SIZE] [--id JEDECID]",
+         "list the part database (PATTERN: '*' and '?' wildcards, any case; --vendor: part of the name)",
+         K::OptionalPattern, {kVendor, kSize, kId},
          false, false, ""},
         {O::Play, "play", "play FILE.svf",
          "play a recorded SVF file on the simulated flash and report mismatches", K::SvfFile, {}, false,

@@ -7,7 +7,7 @@ namespace vorant::cli {
 
 enum class Operation {
     Program, Verify, Checksum, Erase, BlankCheck, Readback, IdCode, Signature,
-    Validate, Status, Release, Unlock, QuadEnable, Parts, Play,
+    Validate, Status, Release, Unlock, QuadEnable, Sfdp, Parts, Play,
 };
 
 // What an operation takes besides its switches.
@@ -22,7 +22,8 @@ enum class OperandKind {
 // A switch an operation passes through to the device.
 struct SwitchInfo {
     std::string_view name;  // with its dash, as the device looks it up
-    bool takesFileName = false;
+    bool takesFileName = false;  // takes a value: the next token
+    std::string_view valueName = "a file name";  // for "needs ..." messages
 };
 
 struct OperationInfo {

@@ -80,7 +80,7 @@ OperationRequest parseOperationTokens(const OperationInfo& info, const std::vect
         request.switchTokens.push_back(token);
         if (sw->takesFileName) {
             if (i + 1 >= tokens.size() || looksLikeSwitch(tokens[i + 1]) || tokens[i + 1].empty())
-                throw UsageError("'" + token + "' needs a file name (" + usageOf(info) + ")");
+                throw UsageError("'" + token + "' needs " + std::string(sw->valueName) + " (" + usageOf(info) + ")");
             request.switchTokens.push_back(tokens[++i]);
         }
     }

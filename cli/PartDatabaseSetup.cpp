@@ -1,6 +1,7 @@
 #include "cli/PartDatabaseSetup.h"
 
 #include "cli/ExecutablePath.h"
+#include "cli/ToolMessages.h"
 #include "cli/UsageError.h"
 #include "host/ConstraintsManager.h"
 #include "host/UT_STR.h"
@@ -43,13 +44,20 @@ void loadPartDatabase(const std::vector<std::string>& extraPartFiles) {
     }
     for (const std::string& file : extraPartFiles) {
         std::error_code error;
-        if (!std::filesystem::is_regular_file(file, error))
-            throw UsageError("--parts " + file + ": no such part file");
+        const bool folder = std::filesystem::is_directory(file, error);
+        if (!folder && !std::filesystem::is_regular_file(file, error))
+            throw UsageError("--parts " + file + ": no such part file or folder");
+        ConstraintsManager::Replacements replaced;
         try {
-            database.loadFile(file);
+            replaced = folder ? database.loadDirectory(file) : database.loadFile(file);
         } catch (const VorantException& problem) {
             throw UsageError(std::string(problem.what()) + "; fix the part file");
         }
+        // Replacing a part is allowed (a board may need other timings), but
+        // never silent: the user learns which entry is now in force.
+        for (const auto& replacement : replaced)
+            toolInfo("part " + replacement.part + " from " + replacement.newSource + " replaces the one from " +
+                     replacement.previousSource + ".");
     }
 }
 

@@ -13,8 +13,9 @@ namespace vorant::cli {
 // Throws UsageError when none is usable.
 std::filesystem::path shippedPartsDirectory();
 
-// Loads the shipped parts, then every extra file in order, into the
-// process-wide part database. Must run before any device exists: a device
+// Loads the shipped parts, then every extra file (or every *.toml of an
+// extra folder) in order, into the process-wide part database; a part that
+// replaces one of an earlier file is reported with one info line. Must run before any device exists: a device
 // reads its whole configuration when it is built. Throws UsageError naming
 // the file, part and key of the first invalid part.
 void loadPartDatabase(const std::vector<std::string>& extraPartFiles);

@@ -1,5 +1,7 @@
 #include "cli/PartIdentification.h"
 
+#include "cli/SfdpMatch.h"
+#include "cli/SfdpOperation.h"
 #include "cli/ToolFailure.h"
 #include "cli/UsageError.h"
 #include "host/ConstraintsManager.h"
@@ -38,6 +40,28 @@ std::string joined(const std::vector<std::string>& names) {
     return text;
 }
 
+// Narrows parts sharing one ID by the chip's SFDP area. Returns what
+// decided when exactly one part remains (left alone in `matches`); otherwise
+// leaves the parts the area fits (all of them when it fits none).
+std::string decideBySfdp(ScanPort& port, std::vector<std::string>& matches) {
+    std::optional<formats::SfdpTable> table;
+    const auto area = readSfdpArea(port);
+    if (!area) return {};
+    try {
+        table = formats::decodeSfdp(*area);
+    } catch (const formats::SfdpError&) {
+        // No usable area: only a part older than SFDP can be this chip.
+    }
+    const std::vector<std::string> fitting = partsFittingSfdp(matches, table);
+    if (fitting.size() == 1) {
+        matches = fitting;
+        return table ? "its SFDP table (size, erase types, page and Quad Enable method fit no other part with this ID)"
+                     : "its missing SFDP table (the other parts with this ID publish one)";
+    }
+    if (!fitting.empty()) matches = fitting;
+    return {};
+}
+
 }  // namespace
 
 bool chipAnswered(const std::string& jedecId) {
@@ -71,7 +95,14 @@ Identification identifyPart(ScanPort& port, int index) {
 
     Identification identification;
     identification.jedecId = id;
-    const std::vector<std::string> matches = ConstraintsManager::instance().partsWithId(identification.jedecId);
+    std::vector<std::string> matches = ConstraintsManager::instance().partsWithId(identification.jedecId);
+    if (matches.size() > 1 && chipAnswered(identification.jedecId)) {
+        if (const std::string decided = decideBySfdp(port, matches); !decided.empty()) {
+            identification.partName = matches.front();
+            identification.decidedBy = decided;
+            return identification;
+        }
+    }
     if (const std::string problem = identificationProblem(identification.jedecId, matches); !problem.empty()) {
         // A chip that does not answer is a failed run; an answer the
         // database cannot place asks the user to name the part.

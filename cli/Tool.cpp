@@ -27,10 +27,21 @@ void printToolError(const std::string& message) {
 }
 
 int listParts(const OperationRequest& request) {
-    const std::string pattern = request.operands.empty() ? "*" : request.operands.front();
-    const std::vector<PartSummary> parts = matchingParts(pattern);
+    PartFilter filter;
+    if (!request.operands.empty()) filter.pattern = request.operands.front();
+    std::string asked = "'" + filter.pattern + "'";
+    const auto& tokens = request.switchTokens;
+    for (std::size_t i = 0; i + 1 < tokens.size(); i += 2) {
+        const std::string& value = tokens[i + 1];
+        asked += " " + tokens[i] + " " + value;
+        if (tokens[i] == "--vendor") filter.vendor = value;
+        if (tokens[i] == "--id") filter.jedecId = value;
+        if (tokens[i] == "--size" && !(filter.sizeBytes = parseSizeText(value)))
+            throw UsageError("--size " + value + " is not a size; give bytes or a unit, such as 16MiB or 128Mbit");
+    }
+    const std::vector<PartSummary> parts = matchingParts(filter);
     if (parts.empty()) {
-        printToolError("no part matches '" + pattern + "'; 'vorant-spi parts' lists them all");
+        printToolError("no part matches " + asked + "; 'vorant-spi parts' lists them all");
         return kExitFailure;
     }
     // The listing is the answer, so --quiet does not hide it.

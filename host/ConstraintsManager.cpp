@@ -1,11 +1,13 @@
 #include "ConstraintsManager.h"
 
 #include "PartFileReader.h"
+#include "PartKeys.h"
 #include "PropertyText.h"
 #include "UT_STR.h"
 #include "VorantException.h"
 
 #include <algorithm>
+#include <cctype>
 #include <filesystem>
 #include <fstream>
 #include <set>
@@ -48,16 +50,16 @@ std::int32_t ConstraintsManager::getDeviceLongProperty(const char* partName, con
     return *value;
 }
 
-void ConstraintsManager::loadFile(const std::string& path) {
+ConstraintsManager::Replacements ConstraintsManager::loadFile(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
     if (!in) throw VorantException(path + ": cannot open the part file");
     std::ostringstream text;
     text << in.rdbuf();
     if (in.bad()) throw VorantException(path + ": cannot read the part file");
-    loadText(text.str(), path);
+    return loadText(text.str(), path);
 }
 
-void ConstraintsManager::loadDirectory(const std::string& path) {
+ConstraintsManager::Replacements ConstraintsManager::loadDirectory(const std::string& path) {
     namespace fs = std::filesystem;
     std::error_code error;
     if (!fs::is_directory(path, error)) throw VorantException(path + ": not a folder of part files");
@@ -65,12 +67,20 @@ void ConstraintsManager::loadDirectory(const std::string& path) {
     for (const auto& entry : fs::directory_iterator(path, error))
         if (entry.is_regular_file() && entry.path().extension() == ".toml") files.push_back(entry.path());
     if (error) throw VorantException(path + ": cannot list the folder: " + error.message());
+    if (files.empty()) throw VorantException(path + ": no part files (*.toml) in the folder");
     std::sort(files.begin(), files.end());
-    for (const auto& file : files) loadFile(file.string());
+    Replacements replaced;
+    for (const auto& file : files) {
+        Replacements more = loadFile(file.string());
+        replaced.insert(replaced.end(), more.begin(), more.end());
+    }
+    return replaced;
 }
 
-void ConstraintsManager::loadText(const std::string& text, const std::string& sourceName) {
+ConstraintsManager::Replacements ConstraintsManager::loadText(const std::string& text, const std::string& sourceName) {
     vorant::host::PartFileTables parsed = vorant::host::readPartFileText(text, sourceName);
+    for (const auto& [name, props] : parsed.families) vorant::host::checkPartKeys(sourceName, "family", name, props);
+    for (const auto& [name, props] : parsed.parts) vorant::host::checkPartKeys(sourceName, "part", name, props);
 
     std::lock_guard<std::mutex> lock(mutex_);
     // Families of this file see each other and every family loaded before.
@@ -107,7 +117,16 @@ void ConstraintsManager::loadText(const std::string& text, const std::string& so
     for (auto& [name, props] : parsed.families) resolve("family", name, props);
 
     families_ = std::move(families);
-    for (auto& [name, p] : resolved) parts_[name] = std::move(p);
+    Replacements replaced;
+    for (auto& [name, p] : resolved) {
+        // Erased first so the new spelling of the name is the one kept.
+        if (auto it = parts_.find(name); it != parts_.end()) {
+            if (it->second.source != sourceName) replaced.push_back(Replacement{name, it->second.source, sourceName});
+            parts_.erase(it);
+        }
+        parts_.emplace(name, std::move(p));
+    }
+    return replaced;
 }
 
 void ConstraintsManager::addPart(const std::string& partName, const std::map<std::string, std::string>& properties) {
@@ -154,6 +173,18 @@ std::vector<std::string> ConstraintsManager::partsWithId(const std::string& hexI
         if (!id.empty() && UT_STR::ICompare(id.c_str(), hexId.c_str()) == 0) names.push_back(name);
     }
     return names;
+}
+
+std::string ConstraintsManager::canonicalName(const std::string& partName) const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    auto it = parts_.find(partName);
+    return it == parts_.end() ? std::string() : it->first;
+}
+
+bool ConstraintsManager::CaseInsensitiveLess::operator()(const std::string& a, const std::string& b) const {
+    return std::lexicographical_compare(a.begin(), a.end(), b.begin(), b.end(), [](char x, char y) {
+        return std::toupper(static_cast<unsigned char>(x)) < std::toupper(static_cast<unsigned char>(y));
+    });
 }
 
 std::string ConstraintsManager::sourceOf(const std::string& partName) const {

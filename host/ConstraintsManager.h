@@ -21,12 +21,26 @@
 //
 // A family may extend another family. Keys of the part override those of
 // its family. Integers and booleans are stored as decimal text and
-// "TRUE"/"FALSE". A later file may redefine a part or family.
+// "TRUE"/"FALSE". A later file may redefine a part or family; the loaders
+// report each part that replaced one from another file.
+//
+// Part names match without regard to letter case: "w25q128jv" finds
+// W25Q128JV, and a later part of either spelling replaces it.
 //
 // Loading validates every part it defines; the first problem throws
-// VorantException naming the file, the part and the key.
+// VorantException naming the file, the part and the key. An unknown key is
+// such a problem too (the error names the nearest known key).
 class VORANT_HOST_API ConstraintsManager {
 public:
+    // A part of a newly loaded file that took the place of one loaded from
+    // another file.
+    struct Replacement {
+        std::string part;
+        std::string previousSource;
+        std::string newSource;
+    };
+    using Replacements = std::vector<Replacement>;
+
     static ConstraintsManager& instance();
 
     // The property's text. Throws VorantException for an unknown part or key.
@@ -37,11 +51,12 @@ public:
     std::int32_t getDeviceLongProperty(const char* partName, const char* key);
 
     // Loads one part file, or every *.toml file of a directory in name
-    // order. Nothing of a file that fails is added.
-    void loadFile(const std::string& path);
-    void loadDirectory(const std::string& path);
+    // order (a directory without one is an error). Nothing of a file that
+    // fails is added.
+    Replacements loadFile(const std::string& path);
+    Replacements loadDirectory(const std::string& path);
     // Loads TOML text; sourceName stands for the file in error messages.
-    void loadText(const std::string& text, const std::string& sourceName);
+    Replacements loadText(const std::string& text, const std::string& sourceName);
 
     // Adds (or replaces) a part without any validation, so tests can reach
     // values no part file may hold.
@@ -56,6 +71,9 @@ public:
     std::vector<std::string> partsWithId(const std::string& hexId) const;
     // The file a part came from ("" for parts added in memory).
     std::string sourceOf(const std::string& partName) const;
+    // The stored spelling of a part name given in any letter case; "" when
+    // there is no such part.
+    std::string canonicalName(const std::string& partName) const;
 
     // Checks one resolved part; throws VorantException "<source>: part
     // <name>: <key>: <reason>" for the first problem.
@@ -72,7 +90,11 @@ private:
     };
     const Part& part(const char* partName, const char* key) const;
 
+    struct CaseInsensitiveLess {
+        bool operator()(const std::string& a, const std::string& b) const;
+    };
+
     mutable std::mutex mutex_;
-    std::map<std::string, Part> parts_;
+    std::map<std::string, Part, CaseInsensitiveLess> parts_;
     std::map<std::string, std::map<std::string, std::string>> families_;
 };

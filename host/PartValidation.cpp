@@ -77,6 +77,9 @@ const char* const kNonNegativeKeys[] = {
     "BULKERASE_WAITTIME",    "BULKERASE_MAXWAITTIME", "WRSR_MAXWAITTIME",
     "INSTRUCTION_LENGTH",    "STATUS_REGISTER_LENGTH", "RELEASE_FROM_STANDBY_MAX_WAITTIME"};
 
+// Erases of one size each; SECTORERASE is the smallest that works anywhere.
+const char* const kEraseGranularities[] = {"SECTORERASE", "BLOCKERASE32", "BLOCKERASE64"};
+
 class PartChecker {
 public:
     PartChecker(const std::string& source, const std::string& part, const std::map<std::string, std::string>& props)
@@ -136,11 +139,8 @@ public:
         if (length("READSTATUS_INSTRUCTION") < 8) fail("READSTATUS_INSTRUCTION", "must be at least 8 bits");
         if (length("READSTATUS2_INSTRUCTION") < 8) fail("READSTATUS2_INSTRUCTION", "must be at least 8 bits");
 
-        // Polling adds the step to the elapsed time before it compares.
-        if (static_cast<long long>(number("PROGRAM_MAXWAITTIME")) + number("PROGRAM_WAITTIME_INC") > INT32_MAX)
-            fail("PROGRAM_MAXWAITTIME", "plus PROGRAM_WAITTIME_INC exceeds the 32-bit range");
-        if (static_cast<long long>(number("BULKERASE_MAXWAITTIME")) + number("BULKERASE_WAITTIME_INC") > INT32_MAX)
-            fail("BULKERASE_MAXWAITTIME", "plus BULKERASE_WAITTIME_INC exceeds the 32-bit range");
+        checkWaitOrder("PROGRAM");
+        checkWaitOrder("BULKERASE");
 
         const std::string& id = text("IDCODE");
         const std::size_t idDigits = flag("USE_RES") ? 2 : 6;
@@ -173,11 +173,51 @@ public:
             const std::string& qe = text("QE_LOCATION");
             if (qe != "SR2.1" && qe != "SR1.6" && qe != "none") fail("QE_LOCATION", "must be SR2.1, SR1.6 or none");
         }
+        if (has("SFDP") && text("SFDP") != "none" &&
+            (!isHexText(text("SFDP")) || text("SFDP").size() % 2 != 0 || text("SFDP").size() < 16))
+            fail("SFDP", "must be the SFDP area as hexadecimal digits (two per byte), or none");
         if (has("WRSR_BITS") && number("WRSR_BITS") != 8 && number("WRSR_BITS") != 16)
             fail("WRSR_BITS", "must be 8 or 16");
-        for (const char* key : {"SECTOR_SIZE", "SIM_PAGE_PROGRAM_US", "SIM_BULK_ERASE_US", "SIM_WRITE_STATUS_US",
+        for (const char* erase : kEraseGranularities) checkEraseGranularity(erase);
+        for (const char* key : {"SIM_SECTOR_ERASE_US", "SIM_BLOCK32_ERASE_US", "SIM_BLOCK64_ERASE_US", "SIM_PAGE_PROGRAM_US",
+                                "SIM_BULK_ERASE_US", "SIM_WRITE_STATUS_US",
                                 "SIM_RELEASE_US"})
             if (has(key) && number(key) < 0) fail(key, "must not be negative");
+    }
+
+    // A wait limit below its first wait would give up before the first
+    // poll; polling adds the step to the elapsed time before it compares,
+    // so limit plus step must stay a 32-bit number.
+    void checkWaitOrder(const std::string& prefix) const {
+        const std::string first = prefix + "_WAITTIME", limit = prefix + "_MAXWAITTIME", step = first + "_INC";
+        if (number(limit) < number(first))
+            fail(limit, std::to_string(number(limit)) + " is below " + first + " (" + std::to_string(number(first)) +
+                            "); the limit must not be shorter than the first wait");
+        if (static_cast<long long>(number(limit)) + number(step) > INT32_MAX)
+            fail(limit, "plus " + step + " exceeds the 32-bit range");
+    }
+
+    // One erase granularity (the smallest erase, the 32 KiB or the 64 KiB
+    // block): each key is optional, but what is given must make sense, and a
+    // complete set of waits must keep their order.
+    void checkEraseGranularity(const std::string& prefix) const {
+        auto has = [&](const std::string& key) { return props_.count(key) != 0; };
+        const std::string instruction = prefix + "_INSTRUCTION";
+        if (has(instruction) && (!isBinaryText(text(instruction)) || text(instruction).size() < 8))
+            fail(instruction, "'" + text(instruction) + "' must be a text of at least eight '0' and '1' characters");
+        const std::string size = prefix == "SECTORERASE" ? "SECTOR_SIZE" : prefix + "_SIZE";
+        if (has(size)) {
+            const std::int32_t bytes = number(size);
+            if (bytes <= 0 || (bytes & (bytes - 1)) != 0) fail(size, "must be a power of two bytes");
+            if (static_cast<long long>(bytes) * 8 > number("DEVICE_SIZE")) fail(size, "is larger than DEVICE_SIZE");
+        }
+        const std::string first = prefix + "_WAITTIME", limit = prefix + "_MAXWAITTIME", step = first + "_INC";
+        for (const std::string& key : {first, limit})
+            if (has(key) && number(key) < 0) fail(key, "must not be negative");
+        if (has(step) && number(step) <= 0) fail(step, "must be greater than 0");
+        if (has(first) && has(limit) && has(step)) checkWaitOrder(prefix);
+        else if (has(first) && has(limit) && number(limit) < number(first))
+            fail(limit, "is below " + first + "; the limit must not be shorter than the first wait");
     }
 
 private:

@@ -1,6 +1,7 @@
 // FlashConfig from a part entry of the part database.
 
 #include "ports/sim/FlashModel.h"
+#include "ports/sim/SfdpImage.h"
 
 #include "host/ConstraintsManager.h"
 #include "host/VorantException.h"
@@ -195,6 +196,14 @@ FlashConfig FlashConfig::fromPartDatabase(const std::string& partName) {
     config.writeStatusUs = part.countOr("SIM_WRITE_STATUS_US", config.writeStatusUs);
     config.releaseUs = part.countOr("SIM_RELEASE_US", config.releaseUs);
 
+    // SFDP: a real chip's dump where the part carries one, none for a part
+    // too old to have it, else an area written from this configuration.
+    if (part.has("SFDP") && part.text("SFDP") != "none") {
+        const std::string hex = part.text("SFDP");
+        config.sfdp.resize(hex.size() / 2);
+        part.hexBytes("SFDP", config.sfdp.data(), config.sfdp.size());
+    }
+
     applyStatusLabels(part, config);
     if (config.qe == QeLocation::Sr1Bit6) {
         config.status1WritableMask |= 0x40;
@@ -202,6 +211,7 @@ FlashConfig FlashConfig::fromPartDatabase(const std::string& partName) {
     } else if (config.qe == QeLocation::Sr2Bit1) {
         config.status2WritableMask |= 0x02;
     }
+    if (!part.has("SFDP")) config.sfdp = sfdpImageFor(config);
     return config;
 }
 

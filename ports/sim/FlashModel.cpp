@@ -21,6 +21,7 @@ constexpr std::uint64_t kNever = std::numeric_limits<std::uint64_t>::max();
 // opcodes, as 4-byte-capable parts know them besides their configured ones.
 constexpr int kRead4 = 0x13, kFastRead4 = 0x0C, kProgram4 = 0x12, kErase64K4 = 0xDC, kErase4K4 = 0x21;
 constexpr int kRead3 = 0x03, kFastRead3 = 0x0B, kProgram3 = 0x02, kErase64K3 = 0xD8, kErase4K3 = 0x20;
+constexpr int kReadSfdp = 0x5A;  // read SFDP: 3-byte address, one dummy byte
 
 void requireConfig(bool condition, const FlashConfig& config, const std::string& what) {
     if (!condition) throw VorantException("simulated flash '" + config.partName + "': " + what);
@@ -119,6 +120,7 @@ void FlashModel::buildOpcodeTable() {
     set(config_.opBulkErase, Command::BulkErase);
     set(config_.opDeepPowerDown, Command::DeepPowerDown);
     set(config_.opReleaseSignature, Command::ReleaseSignature);
+    if (!config_.sfdp.empty()) set(kReadSfdp, Command::ReadSfdp, 3);
 }
 
 // --- chip select -----------------------------------------------------------
@@ -237,6 +239,10 @@ std::uint8_t FlashModel::outputForNextByte() {
             return value;
         }
         case Command::ReleaseSignature: return config_.hasSignature ? config_.signature : 0xFF;
+        case Command::ReadSfdp: {
+            const std::uint32_t at = address_++;
+            return at < config_.sfdp.size() ? config_.sfdp[at] : 0xFF;
+        }
         default: return 0xFF;
         }
     default:
@@ -309,6 +315,7 @@ void FlashModel::startCommand(std::uint8_t opcode) {
     case Command::FastRead:
     case Command::PageProgram:
     case Command::SectorErase:
+    case Command::ReadSfdp:
         address_ = 0;
         pendingBytes_ = entry_.addressBytes;
         phase_ = Phase::Address;
@@ -323,6 +330,11 @@ void FlashModel::startCommand(std::uint8_t opcode) {
 }
 
 void FlashModel::addressComplete() {
+    if (entry_.command == Command::ReadSfdp) {  // an address in the SFDP area, then one dummy byte
+        pendingBytes_ = 1;
+        phase_ = Phase::Dummy;
+        return;
+    }
     address_ %= config_.sizeBytes;  // address bits above the array are ignored
     switch (entry_.command) {
     case Command::Read: phase_ = Phase::ReadData; break;

@@ -52,6 +52,9 @@ struct FlashConfig {
     std::uint8_t blockProtectMask = 0x1C;     // BP0..BP2
     std::uint8_t status1WritableMask = 0xFC;
     std::uint8_t status2WritableMask = 0xFF;
+    // The SFDP area served to 5Ah (3-byte address, one dummy byte; FFh past
+    // its end); empty for a chip without one, which ignores 5Ah.
+    std::vector<std::uint8_t> sfdp;
 
     // Builds the configuration of a part from the process-wide part
     // database (ConstraintsManager). Throws VorantException for an unknown
@@ -122,7 +125,7 @@ public:
 private:
     enum class Command : std::uint8_t {
         None, WriteEnable, WriteDisable, ReadId, ReadStatus1, ReadStatus2, WriteStatus,
-        Read, FastRead, PageProgram, SectorErase, BulkErase, DeepPowerDown, ReleaseSignature,
+        Read, FastRead, PageProgram, SectorErase, BulkErase, DeepPowerDown, ReleaseSignature, ReadSfdp,
     };
     // Where the current transaction stands, byte by byte.
     enum class Phase : std::uint8_t {

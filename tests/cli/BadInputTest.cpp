@@ -14,7 +14,7 @@ protected:
     std::map<std::string, std::string> snapshot() const {
         std::map<std::string, std::string> all;
         for (const auto& entry : fs::recursive_directory_iterator(dir))
-            all[entry.path().string()] = slurp(entry.path());
+            if (entry.is_regular_file()) all[entry.path().string()] = slurp(entry.path());
         return all;
     }
 };
@@ -33,6 +33,10 @@ TEST_P(BadInput, IsRefusedWithOneLineAndChangesNothing) {
     write("huge.svf", "SDR 8 TDI (00);\nSDR 268435456 TDI (0);\nSDR 268435456 TDI (0);\n");
     write("lacking.toml", userPart("TEST_LACKING", "EF40B1", {{"PROGRAM_WAITTIME_INC", ""}}));
     write("invalid.toml", userPart("TEST_ODD_PAGE", "EF40B2", {{"PAGE_SIZE", "2047"}, {"TOTAL_SHIFT_SIZE", "2079"}}));
+    write("misspelt.toml", userPart("TEST_MISSPELT", "EF40B3", {{"PROGRAM_WAITIME", "400"}}));
+    write("backwards.toml", userPart("TEST_BACKWARDS", "EF40B4", {{"PROGRAM_MAXWAITTIME", "300"}}));
+    fs::create_directories(dir / "noparts");
+    write("noparts/readme.txt", "part files go here\n");
     const auto before = snapshot();
 
     const Result result = run(GetParam().args, GetParam().fileLimit);
@@ -60,6 +64,15 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
             "lacking.toml: part TEST_LACKING: PROGRAM_WAITTIME_INC: missing"},
     BadCase{"PartFileWithAnInvalidValue", {"--parts", "invalid.toml", "--part", "TEST_ODD_PAGE", "erase"}, 2,
             "invalid.toml: part TEST_ODD_PAGE: PAGE_SIZE"},
+    BadCase{"PartFileWithAMisspeltKey", {"--parts", "misspelt.toml", "--part", "TEST_MISSPELT", "erase"}, 2,
+            "misspelt.toml: part TEST_MISSPELT: PROGRAM_WAITIME: unknown key; did you mean 'PROGRAM_WAITTIME'?"},
+    BadCase{"PartFileWithALimitBelowItsFirstWait",
+            {"--parts", "backwards.toml", "--part", "TEST_BACKWARDS", "erase"}, 2,
+            "backwards.toml: part TEST_BACKWARDS: PROGRAM_MAXWAITTIME: 300 is below PROGRAM_WAITTIME (400)"},
+    BadCase{"PartFolderWithoutPartFiles", {"--parts", "noparts", "--part", "W25Q16JV", "erase"}, 2,
+            "no part files (*.toml) in the folder"},
+    BadCase{"PartsSizeThatIsNoSize", {"parts", "--size", "16 parsecs"}, 2, "--size 16 parsecs is not a size"},
+    BadCase{"PartsIdWithoutValue", {"parts", "--id"}, 2, "'--id' needs a JEDEC ID such as EF4018"},
     BadCase{"RecordingIntoAMissingFolder", {"--part", "W25Q16JV", "--port", "svf:no/job.svf", "erase"}, 2,
             "no/job.svf"},
     BadCase{"RecordingNeedsAPartName", {"--port", "svf:job.svf", "program", "image.bin"}, 2, "--part NAME"},
@@ -102,8 +115,8 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"QeSet", kSim + Args{"qe", "set"}, 2, "W25Q16JV" + kNoQe},
     BadCase{"QeClear", kSim + Args{"qe", "clear"}, 2, "W25Q16JV" + kNoQe},
     BadCase{"ProgramQebit", kSim + Args{"program", "image.bin", "-e", "-qebit"}, 2, "W25Q16JV" + kNoQe},
-    BadCase{"EraseQebitOnAnIdentifiedChip", {"--chip", "MX25L3233F", "--port", "sim:new.bin", "erase", "-qebit"}, 2,
-            "MX25L3233F" + kNoQe},
+    BadCase{"EraseQebitOnAnIdentifiedChip", {"--chip", "MX25L25645G", "--port", "sim:new.bin", "erase", "-qebit"}, 2,
+            "MX25L25645G" + kNoQe},
     // The port table decides: an unknown port, a key the port does not take,
     // options for a port that has no use for them.
     BadCase{"UnknownPort", {"--port", "usb:0", "erase"}, 2, "unknown port 'usb'; the ports are sim, svf"},

@@ -3,6 +3,9 @@
 // a file, Ctrl-C, parts users add, exit statuses.
 #include "ToolTestFixture.h"
 
+#include <set>
+#include <sstream>
+
 namespace vorant::cli::test {
 namespace {
 
@@ -25,7 +28,15 @@ INSTANTIATE_TEST_SUITE_P(ShippedParts, AutoPart, ::testing::Values(
     AutoCase{"W25Q16JV", "idcode", 0, "Identified W25Q16JV by its JEDEC ID EF4015.", "IDCODE is 'EF4015'"},
     // A part that identifies itself with RES: its device reads the signature.
     AutoCase{"M25P16", "signature", 0, "Identified M25P16 by its JEDEC ID 202015.", "IDCODE is '14'"},
-    AutoCase{"MX25L3233F", "idcode", 0, "Identified MX25L3233F by its JEDEC ID C22016.", "IDCODE is 'C22016'"},
+    AutoCase{"MX25L1606E", "idcode", 0, "Identified MX25L1606E by its JEDEC ID C22015.", "IDCODE is 'C22015'"},
+    // Two generations answer C22016; SFDP tells them apart: the newer one
+    // publishes a table, the older one none.
+    AutoCase{"MX25L3233F", "idcode", 0, "Identified MX25L3233F by its JEDEC ID C22016 and its SFDP table",
+             "IDCODE is 'C22016'"},
+    AutoCase{"MX25L3206E", "idcode", 0, "Identified MX25L3206E by its JEDEC ID C22016 and its missing SFDP table",
+             "IDCODE is 'C22016'"},
+    // EF4018 is shared by parts whose tables fit both alike: both are named.
+    AutoCase{"W25Q128JV", "idcode", 2, "(W25Q128FV, W25Q128JV); choose one with --part NAME", "EF4018"},
     AutoCase{"S25FL064L", "idcode", 0, "Identified S25FL064L by its JEDEC ID 016017.", "IDCODE is '016017'"},
     // Two parts answer 20BA18: the tool names both and wants --part.
     AutoCase{"N25Q128A", "idcode", 2, "(MT25QL128ABA, N25Q128A); choose one with --part NAME", "20BA18"}));
@@ -123,6 +134,85 @@ TEST_F(ToolTest, UserPartWithAnUnusualPageSizeWorksWithoutRebuilding) {
     EXPECT_TRUE(has(ok(port + Args{"program", "image.bin", "-e", "-v"}).out, "Identified MY_FLASH_P128"));
     ok(port + Args{"readback", "-f", "out.bin"});
     EXPECT_TRUE(read("out.bin") == flashWith(image));
+}
+
+TEST_F(ToolTest, SfdpShowsTheChipsTableDecodedOrSaysItHasNone) {
+    // The simulated W25Q128JV serves the area read from a real chip.
+    const Result real = ok({"--part", "W25Q128JV", "--chip", "W25Q128JV", "sfdp"});
+    for (const char* line : {"SFDP revision 1.5, 1 parameter table", "Density: 16777216 bytes",
+                             "Erase type 2: 32768 bytes, opcode 52h, typical 128 ms, maximum 1792 ms",
+                             "Page: 256 bytes, program typical 704 us", "(requirement 4)"})
+        EXPECT_TRUE(has(real.out, line)) << line << "\n" << real.text();
+    const Result old = run({"--chip", "M25P16", "sfdp"});
+    EXPECT_EQ(old.status, 1) << old.text();
+    EXPECT_TRUE(has(old.err, "the chip's SFDP area cannot be used: no SFDP signature")) << old.text();
+    const Result recording = run({"--part", "W25Q16JV", "--port", "svf:job.svf", "sfdp"});
+    EXPECT_EQ(recording.status, 2) << recording.text();
+    EXPECT_FALSE(fs::exists(dir / "job.svf"));
+}
+
+// The listing's first column, one name a line.
+std::vector<std::string> listedParts(const std::string& out) {
+    std::vector<std::string> names;
+    std::istringstream lines(out);
+    std::string line;
+    std::getline(lines, line);  // header
+    while (std::getline(lines, line)) names.push_back(line.substr(0, line.find(' ')));
+    return names;
+}
+
+TEST_F(ToolTest, PartsListsTwoHundredPartsOfTwelveMakersAndFilters) {
+    const Result all = ok({"parts"});
+    EXPECT_TRUE(has(all.out, "PART") && has(all.out, "VENDOR") && has(all.out, "SUPPORT") && has(all.out, "SOURCE"));
+    EXPECT_GE(listedParts(all.out).size(), 200u);
+    std::set<std::string> makers;
+    for (const char* maker : {"Winbond", "Macronix", "GigaDevice", "Micron", "ISSI", "Infineon", "Renesas", "XMC",
+                              "XTX", "Puya", "Zbit", "Boya", "Eon", "Fudan", "ESMT", "Zetta"})
+        if (has(all.out, std::string("  ") + maker)) makers.insert(maker);
+    EXPECT_GE(makers.size(), 12u);
+
+    const std::pair<Args, std::vector<std::string>> filters[] = {
+        {{"parts", "--id", "ef4018"}, {"W25Q128FV", "W25Q128JV"}},
+        {{"parts", "--vendor", "micron", "--size", "128Mbit"},
+         {"M25P128", "MT25QL128ABA", "MT25QU128ABA", "N25Q128A", "N25Q128A11"}},
+        {{"parts", "W25Q*JV", "--size", "32MiB"}, {"W25Q256JV"}},
+    };
+    for (const auto& [args, expected] : filters) EXPECT_EQ(listedParts(ok(args).out), expected) << args[1];
+    const std::string x4 = ok({"parts", "W25Q128JV"}).out;
+    EXPECT_TRUE(has(x4, "x4,unlock  reference table")) << x4;
+    const Result none = run({"parts", "--vendor", "nobody"});
+    EXPECT_EQ(none.status, 1);
+    EXPECT_TRUE(has(none.err, "no part matches '*' --vendor nobody")) << none.text();
+}
+
+TEST_F(ToolTest, PartSfdpBuildsAPartFromTheChipPrintsItAndProgramsWithIt) {
+    const std::string image = randomBytes(5001, 23);
+    write("image.bin", image);
+    const Result built = ok({"--part", "sfdp", "--chip", "W25Q64JV", "--port", "sim:flash.bin", "program", "image.bin",
+                             "-e", "-v"});
+    EXPECT_TRUE(has(built.out, "Identified SFDP_EF4017 by its JEDEC ID EF4017 and its SFDP table")) << built.text();
+    // The printed entry, saved as a file, loads and drives the same chip.
+    const auto from = built.out.find("# Built by"), to = built.out.find("INFO: Identified");
+    ASSERT_TRUE(from != std::string::npos && to != std::string::npos) << built.text();
+    write("saved.toml", built.out.substr(from, to - from));
+    ok({"--parts", "saved.toml", "--part", "sfdp_ef4017", "--chip", "W25Q64JV", "--port", "sim:flash.bin", "verify",
+        "image.bin"});
+    // A chip older than SFDP cannot describe itself.
+    const Result old = run({"--part", "sfdp", "--chip", "M25P16", "--port", "sim:old.bin", "program", "image.bin"});
+    EXPECT_EQ(old.status, 2) << old.text();
+    EXPECT_TRUE(has(old.err, "(JEDEC ID 202015) has no usable SFDP table (no SFDP signature")) << old.text();
+}
+
+TEST_F(ToolTest, AFolderOfUserPartsLoadsAndAReplacedPartIsAnnounced) {
+    fs::create_directories(dir / "mine");
+    write("mine/a.toml", userPart("my_flash_a", "EF40AB"));
+    // Same name as a shipped part in another letter case: it replaces it.
+    write("mine/b.toml", userPart("w25q16jv", "EF4015", {{"DEVICE_SIZE", "16777216"}}));
+    const Result result = ok({"--parts", "mine", "--chip", "My_Flash_A", "--part", "MY_FLASH_A", "--port",
+                              "sim:flash.bin", "idcode"});
+    EXPECT_TRUE(has(result.out, "INFO: part w25q16jv from ")) << result.text();
+    EXPECT_TRUE(has(result.out, "replaces the one from ")) << result.text();
+    EXPECT_TRUE(has(result.out, "EF40AB")) << result.text();
 }
 
 }  // namespace

@@ -91,7 +91,7 @@ TEST_F(ToolTest, AChipThatCannotTakeAWriteIsRefusedFirst) {
         {noUnlock + Args{"--sim-fault", "protected", "program", "image.bin", "-e"}, "'vorant-spi --part NOUNLOCK unlock'"},
         // A part named for another chip: its size and opcodes could ruin it.
         {{"--part", "W25Q16JV", "--chip", "W25Q32JV", "--port", "sim:other.sim", "erase"},
-         "the chip answers the JEDEC ID EF4016 (W25Q32JV), not W25Q16JV's EF4015"},
+         "the chip answers the JEDEC ID EF4016 (W25Q32FV, W25Q32JV), not W25Q16JV's EF4015; nothing was written"},
     };
     for (const auto& [args, line] : runs) {
         const Result result = run(args);

@@ -6,6 +6,8 @@
 
 #include <gtest/gtest.h>
 
+#include <filesystem>
+#include <fstream>
 #include <sstream>
 
 namespace {
@@ -119,6 +121,22 @@ const BadPart kBadParts[] = {
     {"x4 with Quad Enable in register 1", "QE_LOCATION = \"SR1.6\"\n", "QE_LOCATION"},
     {"float value", "PAGE_SIZE = 2048.0\n", "PAGE_SIZE"},
     {"malformed TOML", "PAGE_SIZE = = 3\n", "vendor.toml"},
+    {"misspelt key", "PAGE_SIZ = 2048\n", "PAGE_SIZ: unknown key; did you mean 'PAGE_SIZE'?"},
+    {"misspelt key in another case", "Sim_Page_Program_Us = 700\n", "did you mean 'SIM_PAGE_PROGRAM_US'?"},
+    {"status label past 32 bits", "STATUS_LOCATION_32 = \"QE\"\n", "STATUS_LOCATION_32: unknown key"},
+    {"program limit below the first wait", "PROGRAM_WAITTIME = 800\nPROGRAM_MAXWAITTIME = 700\n",
+     "PROGRAM_MAXWAITTIME: 700 is below PROGRAM_WAITTIME (800)"},
+    {"erase limit below the first wait", "BULKERASE_MAXWAITTIME = 1\n", "BULKERASE_MAXWAITTIME: 1 is below"},
+    {"block limit below the first wait",
+     "BLOCKERASE64_WAITTIME = 150000\nBLOCKERASE64_MAXWAITTIME = 100000\nBLOCKERASE64_WAITTIME_INC = 15000\n",
+     "BLOCKERASE64_MAXWAITTIME"},
+    {"sector limit below the first wait", "SECTORERASE_MAXWAITTIME = 1\n", "SECTORERASE_MAXWAITTIME"},
+    {"block size not a power of two", "BLOCKERASE32_SIZE = 30000\n", "BLOCKERASE32_SIZE"},
+    {"block size past the chip", "BLOCKERASE64_SIZE = 33554432\n", "BLOCKERASE64_SIZE"},
+    {"block opcode in hex", "BLOCKERASE32_INSTRUCTION = \"52\"\n", "BLOCKERASE32_INSTRUCTION"},
+    {"SFDP area not hexadecimal", "SFDP = \"5346445G05010000\"\n", "SFDP"},
+    {"SFDP area of half a byte", "SFDP = \"53464450050100FF0\"\n", "SFDP"},
+    {"zero block polling step", "BLOCKERASE32_WAITTIME_INC = 0\n", "BLOCKERASE32_WAITTIME_INC"},
 };
 INSTANTIATE_TEST_SUITE_P(Validation, InvalidParts, ::testing::ValuesIn(kBadParts));
 
@@ -157,6 +175,56 @@ TEST_F(PartLoading, AMissingKeyIsNamed) {
         EXPECT_NE(std::string(e.what()).find("WRSR_MAXWAITTIME"), std::string::npos);
         EXPECT_NE(std::string(e.what()).find("TESTPART"), std::string::npos);
     }
+}
+
+TEST_F(PartLoading, AMisspeltFamilyKeyIsNamedWhereItIsWritten) {
+    try {
+        db.loadText("[family.F]\nBULKERASE_INSTRUCTON = \"11000111\"\n", "vendor.toml");
+        FAIL();
+    } catch (const VorantException& e) {
+        EXPECT_STREQ(e.what(), "vendor.toml: family F: BULKERASE_INSTRUCTON: unknown key; "
+                               "did you mean 'BULKERASE_INSTRUCTION'?");
+    }
+}
+
+TEST_F(PartLoading, PartNamesMatchInAnyLetterCase) {
+    db.loadText(partFile(vorant::test::w25q128Properties(), ""), "t.toml");
+    EXPECT_TRUE(db.hasPart("testpart"));
+    EXPECT_EQ(db.canonicalName("TestPart"), "TESTPART");
+    EXPECT_EQ(db.getDeviceLongProperty("tEsTpArT", "PAGE_SIZE"), 2048);
+    EXPECT_EQ(db.canonicalName("NOPART"), "");
+}
+
+TEST_F(PartLoading, APartFromAnotherFileThatReplacesOneIsReported) {
+    const std::string text = partFile(vorant::test::w25q128Properties(), "");
+    EXPECT_TRUE(db.loadText(text, "shipped.toml").empty());
+    EXPECT_TRUE(db.loadText(text, "shipped.toml").empty()) << "reloading the same file replaces nothing of another";
+    const auto replaced = db.loadText("[part.testpart]\nextends = \"TEST\"\nDEVICE_SIZE = 67108864\n", "user.toml");
+    ASSERT_EQ(replaced.size(), 1u);
+    EXPECT_EQ(replaced[0].part, "testpart");
+    EXPECT_EQ(replaced[0].previousSource, "shipped.toml");
+    EXPECT_EQ(replaced[0].newSource, "user.toml");
+    EXPECT_EQ(db.partNames(), std::vector<std::string>{"testpart"}) << "one part, under the newer spelling";
+    EXPECT_EQ(db.getDeviceLongProperty("TESTPART", "DEVICE_SIZE"), 67108864);
+}
+
+TEST_F(PartLoading, AFolderLoadsEveryPartFileAndAFolderWithoutOneIsAnError) {
+    const auto folder = std::filesystem::path(::testing::TempDir()) / "part-folder-test";
+    std::filesystem::remove_all(folder);
+    std::filesystem::create_directories(folder);
+    EXPECT_THROW(db.loadDirectory(folder.string()), VorantException);
+    std::ofstream(folder / "notes.txt") << "not a part file\n";
+    try {
+        db.loadDirectory(folder.string());
+        FAIL();
+    } catch (const VorantException& e) {
+        EXPECT_NE(std::string(e.what()).find("no part files (*.toml)"), std::string::npos) << e.what();
+    }
+    std::ofstream(folder / "a.toml") << partFile(vorant::test::w25q128Properties(), "");
+    std::ofstream(folder / "b.toml") << "[part.OTHER]\nextends = \"TEST\"\n";  // uses a.toml's family
+    db.loadDirectory(folder.string());
+    EXPECT_EQ(db.partNames(), (std::vector<std::string>{"OTHER", "TESTPART"}));
+    std::filesystem::remove_all(folder);
 }
 
 TEST_F(PartLoading, AnUnknownOrCircularFamilyIsNamed) {

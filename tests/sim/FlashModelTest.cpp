@@ -77,6 +77,10 @@ TEST(FlashModel, Transcripts) {
         {"ID repeats, signature after three dummy bytes, unknown opcode", nullptr,
          "9F>EF4010EF4010EF|AB 000000>131313|AB>FFFFFF13|77>FFFF"},
         {"no signature", [](FlashConfig& c) { c.hasSignature = false; }, "AB 000000>FFFF"},
+        {"SFDP: a 3-byte address and one dummy byte, then the area from there, FFh past its end",
+         [](FlashConfig& c) { c.sfdp = {0x53, 0x46, 0x44, 0x50, 0x06, 0x01}; },
+         "5A 000000 FF>53464450|5A 000003 00>500601FFFF|5A 010000 00>FF"},
+        {"a chip without SFDP ignores 5Ah", nullptr, "5A 000000 FF>FFFF|9F>EF4010"},
         {"a 32-bit address part: native 4-byte opcodes and legacy 3-byte ones",
          [](FlashConfig& c) {
              c.sizeBytes = 32 * 1024 * 1024, c.addressBytes = 4;
