@@ -8,6 +8,7 @@
 #include "host/VorantException.h"
 #include "s/Type1SPIDevice.h"
 
+#include <algorithm>
 #include <memory>
 
 namespace vorant::cli {
@@ -62,6 +63,46 @@ std::string decideBySfdp(ScanPort& port, std::vector<std::string>& matches) {
     return {};
 }
 
+// Keys that only say how long the chip may take, or describe it.
+bool isTimingKey(const std::string& key) {
+    auto endsWith = [&](const char* tail) {
+        const std::string t = tail;
+        return key.size() >= t.size() && key.compare(key.size() - t.size(), t.size(), t) == 0;
+    };
+    return endsWith("WAITTIME") || endsWith("WAITTIME_INC") || endsWith("MAXWAITTIME") ||
+           key.rfind("PROGRESS_", 0) == 0;
+}
+
+// Parts that share an ID and an SFDP table yet differ only in their times
+// (two generations of one chip, say) drive the chip alike: the one with the
+// longest limits is right for whichever of them answers, since polling
+// ends every wait as soon as the chip is done. Empty when they differ in
+// anything else.
+std::string longestLimitsAmongTimingTwins(const std::vector<std::string>& parts) {
+    ConstraintsManager& database = ConstraintsManager::instance();
+    std::vector<std::string> keys;
+    for (const std::string& key : ConstraintsManager::deviceKeys())
+        if (!isTimingKey(key)) keys.push_back(key);
+    for (const char* key : {"QE_LOCATION", "WRSR_BITS", "SECTOR_SIZE"}) keys.push_back(key);
+    auto value = [&](const std::string& part, const std::string& key) {
+        return database.hasProperty(part, key) ? std::string(database.getDeviceStringProperty(part.c_str(), key.c_str()))
+                                               : std::string();
+    };
+    for (const std::string& part : parts)
+        for (const std::string& key : keys)
+            if (value(part, key) != value(parts.front(), key)) return {};
+    auto limits = [&](const std::string& part) {
+        long long total = 0;
+        for (const char* key : {"PROGRAM_MAXWAITTIME", "BULKERASE_MAXWAITTIME", "WRSR_MAXWAITTIME",
+                                "SECTORERASE_MAXWAITTIME"})
+            if (database.hasProperty(part, key)) total += database.getDeviceLongProperty(part.c_str(), key);
+        return total;
+    };
+    return *std::max_element(parts.begin(), parts.end(), [&](const std::string& a, const std::string& b) {
+        return limits(a) < limits(b);
+    });
+}
+
 }  // namespace
 
 bool chipAnswered(const std::string& jedecId) {
@@ -100,6 +141,12 @@ Identification identifyPart(ScanPort& port, int index) {
         if (const std::string decided = decideBySfdp(port, matches); !decided.empty()) {
             identification.partName = matches.front();
             identification.decidedBy = decided;
+            return identification;
+        }
+        if (const std::string twin = longestLimitsAmongTimingTwins(matches); !twin.empty()) {
+            identification.partName = twin;
+            identification.decidedBy = "its limits: " + joined(matches) +
+                                       " differ only in their times, and its limits are the longest";
             return identification;
         }
     }
