@@ -91,9 +91,10 @@ void decodeBasicTable(const std::vector<std::uint32_t>& dw, SfdpTable& table) {
         const std::uint32_t half = field(dw[type <= 2 ? 7 : 8], type % 2 ? 0 : 16, 16);
         const std::uint32_t exponent = field(half, 0, 8);
         if (exponent == 0) continue;  // type absent, whatever its opcode byte says
-        if (exponent > 63 || (1ull << exponent) > table.densityBytes)
+        // An erase size is kept in 32 bits: a larger one fits no chip here.
+        if (exponent > 31 || (1ull << exponent) > table.densityBytes)
             throw SfdpError("erase type " + std::to_string(type) + " of 2^" + std::to_string(exponent) +
-                            " bytes is larger than the chip");
+                            " bytes is larger than the chip or than 4 GiB");
         SfdpEraseType erase;
         erase.type = type;
         erase.sizeBytes = static_cast<std::uint32_t>(1ull << exponent);

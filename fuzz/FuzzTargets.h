@@ -19,6 +19,10 @@ void fuzzSvf(const std::uint8_t* data, std::size_t size);
 void fuzzPartFile(const std::uint8_t* data, std::size_t size);
 // Command-line arguments, separated by NUL bytes, through the tool's parser.
 void fuzzCommandLine(const std::uint8_t* data, std::size_t size);
+// S-record text through the reader into address ranges.
+void fuzzSRecords(const std::uint8_t* data, std::size_t size);
+// An SFDP area, as a chip answers 5Ah, through the decoder.
+void fuzzSfdp(const std::uint8_t* data, std::size_t size);
 
 struct FuzzTarget {
     const char* name;  // its folder under fuzz/corpus and fuzz/regressions
@@ -31,6 +35,8 @@ inline const std::vector<FuzzTarget>& fuzzTargets() {
         {"svf", fuzzSvf},
         {"part_file", fuzzPartFile},
         {"command_line", fuzzCommandLine},
+        {"srecord", fuzzSRecords},
+        {"sfdp", fuzzSfdp},
     };
     return targets;
 }

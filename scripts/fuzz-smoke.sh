@@ -15,7 +15,7 @@ seconds=${VORANT_FUZZ_SECONDS:-30}
 findings=build/fuzz/findings
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
-targets=(intel_hex svf part_file command_line)
+targets=(intel_hex svf part_file command_line srecord sfdp)
 failed=()
 for target in "${targets[@]}"; do
   mkdir -p "$findings/$target" "$scratch/$target"
