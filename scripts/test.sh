@@ -10,4 +10,6 @@ nm -D --defined-only build/ci/bin/libVorantType1SPIDevice.so | grep -q ' T creat
   || { echo "FAIL: libVorantType1SPIDevice.so does not export create_type1_spi_device" >&2; exit 1; }
 # The speed budget of a 16 MiB job, printed for the record (not asserted).
 build/ci/bin/vorant-bench
+# Programming only what an image covers, against the physical bound of each job.
+build/ci/bin/vorant-block-bench
 ctest --preset ci
