@@ -9,6 +9,7 @@
 // bound, their ratio, CPU time and the process's peak RSS so far.
 //
 //   vorant-block-bench [PART]
+#include "bench/ResourceUsage.h"
 #include "formats/FlashImage.h"
 #include "host/ConstraintsManager.h"
 #include "host/MessageSinks.h"
@@ -22,23 +23,12 @@
 #include <string>
 #include <vector>
 
-#if defined(__linux__)
-#  include <sys/resource.h>
-#endif
 
 namespace {
 
 using Bytes = std::vector<unsigned char>;
 
-long peakResidentKiB() {
-#if defined(__linux__)
-    rusage usage{};
-    getrusage(RUSAGE_SELF, &usage);
-    return usage.ru_maxrss;
-#else
-    return -1;
-#endif
-}
+using vorant::bench::peakResidentKiB;
 
 Bytes randomBytes(std::size_t count, unsigned seed) {
     Bytes bytes(count);

@@ -3,6 +3,7 @@
 // Prints CPU time, peak memory and simulated bus time for each.
 //
 //   vorant-bench [PART] [SVF-FILE]
+#include "bench/ResourceUsage.h"
 #include "formats/FlashImage.h"
 #include "host/ConstraintsManager.h"
 #include "host/MessageSinks.h"
@@ -18,21 +19,10 @@
 #include <random>
 #include <string>
 
-#if defined(__linux__)
-#  include <sys/resource.h>
-#endif
 
 namespace {
 
-long peakResidentKiB() {
-#if defined(__linux__)
-    rusage usage{};
-    getrusage(RUSAGE_SELF, &usage);
-    return usage.ru_maxrss;
-#else
-    return -1;
-#endif
-}
+using vorant::bench::peakResidentKiB;
 
 double cpuSeconds() { return static_cast<double>(std::clock()) / CLOCKS_PER_SEC; }
 

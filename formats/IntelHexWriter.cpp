@@ -1,6 +1,5 @@
 #include "formats/IntelHexWriter.h"
 
-#include "formats/BitReversal.h"
 
 #include <algorithm>
 #include <cstdio>
@@ -11,12 +10,6 @@ namespace {
 
 constexpr char kHexDigits[] = "0123456789ABCDEF";
 constexpr std::size_t kTextFlushSize = 64 * 1024;
-
-std::string hexNumber(std::uint64_t value) {
-    char text[24];
-    std::snprintf(text, sizeof text, "0x%08llX", static_cast<unsigned long long>(value));
-    return text;
-}
 
 // Checked before the output file is created.
 const std::string& withValidLayout(const std::string& path, const IntelHexLayout& layout) {
@@ -29,11 +22,11 @@ const std::string& withValidLayout(const std::string& path, const IntelHexLayout
 
 }  // namespace
 
+// Each record covers one aligned block of bytesPerRecord; a block never
+// crosses a 64 KiB bound, so no record needs two upper addresses.
 IntelHexWriter::IntelHexWriter(const std::string& path, IntelHexLayout layout)
-    : AtomicFileWriter(withValidLayout(path, layout)),
-      recordBytes_(static_cast<std::size_t>(layout.bytesPerRecord)),
+    : RecordFileWriter(withValidLayout(path, layout), static_cast<std::size_t>(layout.bytesPerRecord), "Intel HEX"),
       lineEnd_(layout.crlf ? "\r\n" : "\n") {
-    pending_.reserve(recordBytes_);
     text_.reserve(kTextFlushSize + 128);
 }
 
@@ -56,17 +49,15 @@ void IntelHexWriter::appendRecord(unsigned char type, unsigned address, const un
     text_ += lineEnd_;
 }
 
-void IntelHexWriter::flushRecord() {
-    if (pending_.empty()) return;
-    const auto upper = static_cast<long long>(recordAddress_ >> 16);
+void IntelHexWriter::emitRecord(std::uint64_t address, const unsigned char* bytes, std::size_t count) {
+    const auto upper = static_cast<long long>(address >> 16);
     if (upper != upperAddress_) {
         const unsigned char segment[2] = {static_cast<unsigned char>(upper >> 8),
                                           static_cast<unsigned char>(upper)};
         appendRecord(0x04, 0, segment, 2);
         upperAddress_ = upper;
     }
-    appendRecord(0x00, static_cast<unsigned>(recordAddress_ & 0xFFFF), pending_.data(), pending_.size());
-    pending_.clear();
+    appendRecord(0x00, static_cast<unsigned>(address & 0xFFFF), bytes, count);
 }
 
 bool IntelHexWriter::writeText() {
@@ -75,34 +66,7 @@ bool IntelHexWriter::writeText() {
     return checkStream();
 }
 
-bool IntelHexWriter::writeData(const unsigned char* data, int offset, int bits, int /*reserved*/) {
-    std::size_t count = 0;
-    if (!acceptData(data, offset, bits, count)) return false;
-    if (count == 0) return true;
-    auto address = static_cast<std::uint64_t>(offset);
-    if (address < nextAddress_) {
-        return fail(targetName() + ": data at " + hexNumber(address) + " arrive below data already written (up to " +
-                    hexNumber(nextAddress_ - 1) + "); Intel HEX output takes data in ascending order");
-    }
-    if (address != nextAddress_) flushRecord();
-
-    // Each record covers one aligned block of recordBytes_; a block never
-    // crosses a 64 KiB bound, so no record needs two upper addresses.
-    while (count > 0) {
-        if (pending_.empty()) recordAddress_ = address;
-        const std::uint64_t blockEnd = (address / recordBytes_ + 1) * recordBytes_;
-        const auto take = static_cast<std::size_t>(std::min<std::uint64_t>(count, blockEnd - address));
-        const std::size_t filled = pending_.size();
-        pending_.resize(filled + take);
-        reverseBitsOfEachByte(data, take, pending_.data() + filled);
-        data += take;
-        count -= take;
-        address += take;
-        if (address == blockEnd) flushRecord();
-    }
-    nextAddress_ = address;
-    return text_.size() < kTextFlushSize || writeText();
-}
+bool IntelHexWriter::afterData() { return text_.size() < kTextFlushSize || writeText(); }
 
 bool IntelHexWriter::finishData() {
     flushRecord();

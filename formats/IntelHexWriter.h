@@ -1,5 +1,5 @@
 #pragma once
-#include "formats/AtomicFileWriter.h"
+#include "formats/RecordFileWriter.h"
 
 #include <cstdint>
 #include <string>
@@ -21,26 +21,21 @@ struct IntelHexLayout {
 // starts at or past the end of the data before it (gaps become holes, which
 // read 0xFF). Data below that end are refused: writeData answers false,
 // errorMessage() says why, and endWrite() leaves the target untouched.
-class IntelHexWriter final : public AtomicFileWriter {
+class IntelHexWriter final : public RecordFileWriter {
 public:
     // Throws FormatError when path cannot be written (creating nothing), and
     // std::invalid_argument for a record size other than 16 or 32.
     IntelHexWriter(const std::string& path, IntelHexLayout layout);
 
-    bool writeData(const unsigned char* data, int offset, int bits, int reserved) override;
-
 private:
     bool finishData() override;
-    void flushRecord();
+    void emitRecord(std::uint64_t address, const unsigned char* bytes, std::size_t count) override;
+    bool afterData() override;
     void appendRecord(unsigned char type, unsigned address, const unsigned char* data, std::size_t count);
     void appendByte(unsigned value);
     bool writeText();
 
-    const std::size_t recordBytes_;
     const char* const lineEnd_;
-    std::uint64_t nextAddress_ = 0;    // the end of the data so far
-    std::uint64_t recordAddress_ = 0;  // address of pending_[0]
-    std::vector<unsigned char> pending_;
     long long upperAddress_ = -1;      // upper 16 bits announced by the last 04 record
     std::string text_;
     unsigned checksum_ = 0;

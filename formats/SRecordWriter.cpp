@@ -1,6 +1,5 @@
 #include "formats/SRecordWriter.h"
 
-#include "formats/BitReversal.h"
 #include "formats/ConfigDataFiles.h"
 
 #include <algorithm>
@@ -30,8 +29,7 @@ int dataTypeOf(const std::string& path) {
 }  // namespace
 
 SRecordWriter::SRecordWriter(const std::string& path)
-    : AtomicFileWriter(path), dataType_(dataTypeOf(path)), addressBytes_(dataType_ + 1) {
-    pending_.reserve(kRecordBytes);
+    : RecordFileWriter(path, kRecordBytes, "S-record"), dataType_(dataTypeOf(path)), addressBytes_(dataType_ + 1) {
     appendRecord(0, 0, 2, reinterpret_cast<const unsigned char*>(kHeader), sizeof kHeader - 1);
 }
 
@@ -53,11 +51,9 @@ void SRecordWriter::appendRecord(int type, std::uint64_t address, int addressByt
     text_ += '\n';
 }
 
-void SRecordWriter::flushRecord() {
-    if (pending_.empty()) return;
-    appendRecord(dataType_, recordAddress_, addressBytes_, pending_.data(), pending_.size());
+void SRecordWriter::emitRecord(std::uint64_t address, const unsigned char* bytes, std::size_t count) {
+    appendRecord(dataType_, address, addressBytes_, bytes, count);
     ++records_;
-    pending_.clear();
 }
 
 bool SRecordWriter::writeText() {
@@ -66,35 +62,15 @@ bool SRecordWriter::writeText() {
     return checkStream();
 }
 
-bool SRecordWriter::writeData(const unsigned char* data, int offset, int bits, int /*reserved*/) {
-    std::size_t count = 0;
-    if (!acceptData(data, offset, bits, count)) return false;
-    if (count == 0) return true;
-    auto address = static_cast<std::uint64_t>(offset);
-    if (address < nextAddress_)
-        return fail(targetName() + ": data at " + hexNumber(address) + " arrive below data already written (up to " +
-                    hexNumber(nextAddress_ - 1) + "); S-record output takes data in ascending order");
+bool SRecordWriter::acceptRange(std::uint64_t address, std::size_t count) {
     const std::uint64_t reach = std::uint64_t{1} << (8 * addressBytes_);
-    if (address + count > reach)
-        return fail(targetName() + ": data up to " + hexNumber(address + count - 1) + " do not fit S" +
-                    std::to_string(dataType_) + " records (they reach " + hexNumber(reach - 1) +
-                    "); name the file .s37 or .srec");
-    if (address != nextAddress_) flushRecord();
-    while (count > 0) {
-        if (pending_.empty()) recordAddress_ = address;
-        const std::uint64_t blockEnd = (address / kRecordBytes + 1) * kRecordBytes;
-        const auto take = static_cast<std::size_t>(std::min<std::uint64_t>(count, blockEnd - address));
-        const std::size_t filled = pending_.size();
-        pending_.resize(filled + take);
-        reverseBitsOfEachByte(data, take, pending_.data() + filled);
-        data += take;
-        count -= take;
-        address += take;
-        if (address == blockEnd) flushRecord();
-    }
-    nextAddress_ = address;
-    return text_.size() < kTextFlushSize || writeText();
+    if (address + count <= reach) return true;
+    return fail(targetName() + ": data up to " + hexNumber(address + count - 1) + " do not fit S" +
+                std::to_string(dataType_) + " records (they reach " + hexNumber(reach - 1) +
+                "); name the file .s37 or .srec");
 }
+
+bool SRecordWriter::afterData() { return text_.size() < kTextFlushSize || writeText(); }
 
 bool SRecordWriter::finishData() {
     flushRecord();

@@ -1,5 +1,5 @@
 #pragma once
-#include "formats/AtomicFileWriter.h"
+#include "formats/RecordFileWriter.h"
 
 #include <cstdint>
 #include <string>
@@ -14,16 +14,16 @@ namespace vorant::formats {
 // Captured bytes are bit-reversed back to flash bytes. Data arrive in
 // ascending order, as for Intel HEX; data past the type's reach are
 // refused.
-class SRecordWriter final : public AtomicFileWriter {
+class SRecordWriter final : public RecordFileWriter {
 public:
     // Throws FormatError when path cannot be written; creates nothing then.
     explicit SRecordWriter(const std::string& path);
 
-    bool writeData(const unsigned char* data, int offset, int bits, int reserved) override;
-
 private:
     bool finishData() override;
-    void flushRecord();
+    void emitRecord(std::uint64_t address, const unsigned char* bytes, std::size_t count) override;
+    bool acceptRange(std::uint64_t address, std::size_t count) override;
+    bool afterData() override;
     void appendRecord(int type, std::uint64_t address, int addressBytes, const unsigned char* data,
                       std::size_t count);
     void appendByte(unsigned value);
@@ -31,9 +31,6 @@ private:
 
     int dataType_;      // 1, 2 or 3
     int addressBytes_;  // 2, 3 or 4
-    std::uint64_t nextAddress_ = 0;
-    std::uint64_t recordAddress_ = 0;
-    std::vector<unsigned char> pending_;
     std::uint64_t records_ = 0;
     std::string text_;
     unsigned sum_ = 0;

@@ -61,14 +61,8 @@ bool Type1SPIDevice::readFlash(unsigned address, unsigned char* bytes, std::size
 bool Type1SPIDevice::programBlocks(int index, UT_CMDARGS* args) {
     const bool fileMode = port().outputMode();
     const bool verifyAfter = switchGiven(args, "-v") || switchGiven(args, "-verify");
-    ConfigDataReader* reader = getConfigData();
-    if (reader == nullptr) {
-        DEVICE_MESSAGE().issueInfo(
-            "'%d':Programming terminated, Please assign a configuration Bitstream before attempting "
-            "this operation\n",
-            index);
-        return false;
-    }
+    ConfigDataReader* reader = dataToProgram(index);
+    if (reader == nullptr) return false;
     const std::vector<vorant::device::BlockEraseType> types =
         vorant::device::readBlockEraseTypes(constraints(), getPartName());
     if (types.empty() || pageSize_ / 8 <= 0) {

@@ -26,14 +26,8 @@ bool Type1SPIDevice::program(int index, UT_CMDARGS* args) {
 
     // Every refusal comes before the first scan: a refused "program -e" must
     // not have wiped the flash already.
-    ConfigDataReader* reader = getConfigData();
-    if (reader == nullptr) {
-        DEVICE_MESSAGE().issueInfo(
-            "'%d':Programming terminated, Please assign a configuration Bitstream before attempting "
-            "this operation\n",
-            index);
-        return false;
-    }
+    ConfigDataReader* reader = dataToProgram(index);
+    if (reader == nullptr) return false;
     // Pages advance by whole bytes; a page under one byte would rewrite
     // address 0 over and over.
     if (pageSize_ / 8 <= 0) {
@@ -111,6 +105,18 @@ bool Type1SPIDevice::program(int index, UT_CMDARGS* args) {
     if (result && (switchGiven(args, "-v") || switchGiven(args, "-verify"))) result = verify(index, args);
 
     return finishProgramming(index, args, result);
+}
+
+// The configuration data to program; without any, says so and gives null.
+ConfigDataReader* Type1SPIDevice::dataToProgram(int index) {
+    ConfigDataReader* reader = getConfigData();
+    if (reader == nullptr) {
+        DEVICE_MESSAGE().issueInfo(
+            "'%d':Programming terminated, Please assign a configuration Bitstream before attempting "
+            "this operation\n",
+            index);
+    }
+    return reader;
 }
 
 // A page the port could not send is not in the flash: going on would end in

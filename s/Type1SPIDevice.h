@@ -16,6 +16,7 @@
 #endif
 
 class UT_CMDARGS;
+class ConfigDataReader;
 namespace vorant::device {
 struct BlockEraseType;
 }  // namespace vorant::device
@@ -96,6 +97,7 @@ private:
     PageOutcome writePage(int index, UT_CMDARGS* args, RLBitVec& frame, bool fileMode);
     void reportPageFailure(int index, PageOutcome outcome, unsigned address);
     bool finishProgramming(int index, UT_CMDARGS* args, bool result);
+    ConfigDataReader* dataToProgram(int index);
     // Reads `count` bytes from `address` page by page into `bytes`, each
     // page's capture preloaded with `expected` (may be null: zeros), which a
     // recording compares.
