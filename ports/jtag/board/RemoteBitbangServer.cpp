@@ -17,6 +17,9 @@ namespace vorant::ports::jtag {
 
 namespace {
 
+// Room for the characters of many long scans at once.
+constexpr int kReceiveWindowBytes = 32 * 1024 * 1024;
+
 std::string systemError(const std::string& what) { return what + ": " + std::strerror(errno); }
 
 bool sendAll(int fd, const std::string& bytes) {
@@ -56,6 +59,16 @@ RemoteBitbangServer::RemoteBitbangServer(BoardModel& board, const std::string& h
     listener_ = ::socket(AF_INET, SOCK_STREAM, 0);
     const int yes = 1;
     if (listener_ >= 0) ::setsockopt(listener_, SOL_SOCKET, SO_REUSEADDR, &yes, sizeof yes);
+    // OpenOCD's remote_bitbang writes without waiting and gives up when the
+    // socket is full (EAGAIN), which a board slower than its adapter (a
+    // sanitizer build, a loaded machine) would otherwise cause during a long
+    // SVF run. A large receive window, set before the connection is
+    // accepted so the window scale allows it, takes whole runs of scans.
+    if (listener_ >= 0) {
+        const int window = kReceiveWindowBytes;
+        if (::setsockopt(listener_, SOL_SOCKET, SO_RCVBUFFORCE, &window, sizeof window) != 0)
+            ::setsockopt(listener_, SOL_SOCKET, SO_RCVBUF, &window, sizeof window);
+    }
     if (listener_ < 0 || ::bind(listener_, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 ||
         ::listen(listener_, 1) != 0)
         throw std::runtime_error(systemError("cannot listen on " + host + ":" + std::to_string(port)));
