@@ -21,6 +21,7 @@
 #include "cli/ToolMessages.h"
 #include "cli/UsageError.h"
 #include "formats/ConfigDataFiles.h"
+#include "formats/FlashImage.h"
 #include "formats/FixedWidthCif.h"
 #include "host/ConstraintsManager.h"
 #include "host/UT_STR.h"
@@ -251,6 +252,26 @@ WriteCheck writeCheckFor(Operation operation, bool identified, bool force) {
     return check;
 }
 
+// A recording cannot read a block to keep what lies around an image in it:
+// programming block by block, it would erase those bytes. Says so before
+// anything is recorded, with the two ways on.
+void checkWholeBlocksForRecording(ConfigDataReader& image, const std::string& file, const std::string& part) {
+    const auto* ranges = dynamic_cast<const formats::FlashImage*>(&image);
+    ConstraintsManager& database = ConstraintsManager::instance();
+    if (ranges == nullptr || !database.hasProperty(part, "SECTOR_SIZE")) return;
+    const auto sector = static_cast<std::uint64_t>(database.getDeviceLongProperty(part.c_str(), "SECTOR_SIZE"));
+    if (sector == 0) return;
+    for (const formats::ImageRange& range : ranges->ranges()) {
+        if (range.address % sector == 0 && range.end() % sector == 0) continue;
+        const std::uint64_t edge = range.address % sector != 0 ? range.address : range.end();
+        char address[24];
+        std::snprintf(address, sizeof address, "0x%llX", static_cast<unsigned long long>(edge / sector * sector));
+        throw UsageError(file + " covers the block at " + address +
+                         " only in part, and a recording cannot read the rest of it to keep it; give "
+                         "--erase-whole-blocks to accept that it is erased, or -e for the whole-chip erase");
+    }
+}
+
 // Everything a run needs before its first scan, checked in the order that
 // keeps a refused run free of side effects: options, part, files, then the
 // port and (for --part auto) the identification over it.
@@ -283,6 +304,8 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
     if (info.operand == OperandKind::ImageFile) run.image = openImage(run.file, options.image);
     if (info.operation == Operation::Readback) checkReadbackTarget(run.file);
     if (run.image && !options.autoPart()) checkImageFits(*run.image, run.file, options.part);
+    if (run.image && !caps.readsBack && programsBlocks(request, options) && !options.eraseWholeBlocks)
+        checkWholeBlocksForRecording(*run.image, run.file, options.part);
 
     run.session = PortSession::open(options, options.autoPart() ? std::string() : options.part);
     run.part = options.part;

@@ -76,6 +76,11 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"RecordingIntoAMissingFolder", {"--part", "W25Q16JV", "--port", "svf:no/job.svf", "erase"}, 2,
             "no/job.svf"},
     BadCase{"RecordingNeedsAPartName", {"--port", "svf:job.svf", "program", "image.bin"}, 2, "--part NAME"},
+    // 5001 bytes end inside their second 4 KiB block, which a recording
+    // cannot read to keep.
+    BadCase{"RecordingCoversABlockInPart", {"--part", "W25Q16JV", "--port", "svf:job.svf", "program", "image.bin"}, 2,
+            "image.bin covers the block at 0x1000 only in part, and a recording cannot read the rest of it to keep "
+            "it; give --erase-whole-blocks"},
     BadCase{"RecordingOverItsOwnImage", {"--part", "W25Q16JV", "--port", "svf:image.bin", "program", "image.bin"}, 2,
             "would replace the image image.bin"},
     BadCase{"RecordingOfABadImageKeepsTheOldFile",

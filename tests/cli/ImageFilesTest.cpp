@@ -84,6 +84,10 @@ TEST_F(ToolTest, ProgramKeepsWhatTheImageDoesNotCover) {
     std::string expected = std::string(kSimBytes, '\xff').replace(0, boot.size(), boot);
     expected.replace(0x10000, app.size(), app).replace(0x10C00, tail.size(), tail);
     EXPECT_TRUE(read("out.bin") == expected);
+    // A recording erases whole blocks only where that was accepted.
+    ok(Args{"--part", "W25Q16JV", "--port", "svf:job.svf", "--erase-whole-blocks", "--offset", "0x10C00", "program",
+            "tail.bin"});
+    EXPECT_TRUE(has(read("job.svf"), "//Loading device with 'block erase' instruction."));
     // The same image again changes nothing: no block is erased.
     EXPECT_TRUE(has(ok(kSim + Args{"--offset", "0x10000", "program", "app.bin"}).out, "0 blocks erased"));
 }
