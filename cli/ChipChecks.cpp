@@ -3,10 +3,13 @@
 #include "cli/ChipProbe.h"
 #include "cli/ToolFailure.h"
 #include "host/ConstraintsManager.h"
+#include "host/RLBitVec.h"
 #include "host/UT_STR.h"
 
 #include <cstdint>
 #include <cstdio>
+#include <string>
+#include <vector>
 
 namespace vorant::cli {
 
@@ -96,6 +99,22 @@ void checkChipBeforeWrite(ScanPort& port, const std::string& part, const WriteCh
     ChipProbe probe(port);
     if (check.chipMustAnswer) checkChipAnswers(probe, port, part, check.idMustMatch);
     if (check.noBlockProtection && !partFlag(part, "USE_UNLOCKSR")) checkNoBlockProtection(probe, port, part);
+}
+
+bool recordIdCheck(ScanPort& port, const std::string& part) {
+    const std::string id = partJedecId(part);
+    if (id.size() != 2 * kIdBytes) return true;
+    std::vector<std::uint8_t> expected(kIdBytes);
+    for (int k = 0; k < kIdBytes; ++k) expected[k] = static_cast<std::uint8_t>(std::stoul(id.substr(2 * k, 2), nullptr, 16));
+    const std::string instruction = partText(part, "IDENTIFICATION_INSTRUCTION");
+    RLBitVec opcode(instruction.size(), false);
+    for (std::size_t j = 0; j < instruction.size(); ++j) opcode.setBit(j, instruction[j] == '1');
+    RLBitVec opcodeOnes(opcode.length(), true), opcodeZeros(opcode.length(), false);
+    // The expected answer in the wire layout: first byte first, MSB first.
+    RLBitVec answer(expected.data(), expected.size() * 8), answerOnes(answer.length(), true);
+    port.comment(("//Checking the chip's JEDEC ID (" + id + "): a player stops here on another chip.\n").c_str());
+    const bool opened = port.shift(ScanStage::kOpen, &opcode, &opcodeOnes, &opcodeZeros, &opcodeZeros);
+    return port.shift(ScanStage::kCaptureClose, &answer, &answerOnes, &answer, &answerOnes) && opened;
 }
 
 void checkQuadEnableAfterWrite(ScanPort& port, const std::string& part, bool expectedSet) {

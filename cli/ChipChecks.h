@@ -22,6 +22,12 @@ struct WriteCheck {
 // names the cause and the operation that mends it.
 void checkChipBeforeWrite(ScanPort& port, const std::string& part, const WriteCheck& check);
 
+// The same check for a recording: an ID read whose expected answer is the
+// part's JEDEC ID, so a player stops on another chip before anything is
+// erased. Parts without a JEDEC ID record nothing. False when the port
+// refused the scan.
+bool recordIdCheck(ScanPort& port, const std::string& part);
+
 // Reads status register 2 back after an operation that wrote Quad Enable
 // and throws ToolFailure when the bit is not what was asked.
 void checkQuadEnableAfterWrite(ScanPort& port, const std::string& part, bool expectedSet);

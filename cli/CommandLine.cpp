@@ -82,7 +82,7 @@ struct ParsedValues {
     std::string format;
     bool dataWidthGiven = false, clockGiven = false, offsetGiven = false;
     bool debug = false, quiet = false, version = false, force = false;
-    bool noErase = false, noVerify = false, eraseWholeBlocks = false;
+    bool noErase = false, noVerify = false, eraseWholeBlocks = false, allMismatches = false;
     std::vector<std::string> simFaults;
     // Every key of the port table's rows, also accepted as --KEY VALUE.
     std::map<std::string, std::string> portKeys;
@@ -127,6 +127,8 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
     app.add_flag("--erase-whole-blocks", values.eraseWholeBlocks,
                  "program into a recording: erase blocks the image covers only in part (a recording cannot keep "
                  "their other bytes)");
+    app.add_flag("--all-mismatches", values.allMismatches,
+                 "play: go on past the first TDO mismatch and report every one (default: stop at the first)");
     app.add_flag("--debug", values.debug, "Show debug traces");
     app.add_flag("--quiet", values.quiet, "Show only errors: no status lines, progress or summary");
     // The ports' own keys: the tool knows them only from the port table.
@@ -242,6 +244,7 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.noErase = values.noErase;
     options.noVerify = values.noVerify;
     options.eraseWholeBlocks = values.eraseWholeBlocks;
+    options.allMismatches = values.allMismatches;
     options.simFaults = values.simFaults;
     return options;
 }

@@ -29,6 +29,7 @@ struct ToolOptions {
     // program: no erase at all, no verify, and (for a recording) erase
     // blocks the image covers only in part.
     bool noErase = false, noVerify = false, eraseWholeBlocks = false;
+    bool allMismatches = false;  // play: report every mismatch, not stop at the first
     std::vector<std::string> simFaults;
     formats::ImageOptions image;  // --format and --offset
 

@@ -325,9 +325,13 @@ PreparedRun prepareRun(const ToolOptions& options, const OperationRequest& reque
         }
         checkSignatureKnown(run.part, info);
         run.device = createDevice(run.part);
-        // A recording has no chip to ask; its player checks.
+        // A recording has no chip to ask: it opens with the ID check, which
+        // its player makes before anything is erased.
+        const WriteCheck check = writeCheckFor(info.operation, identification.has_value(), options.force);
         if (!run.session->port().outputMode())
-            checkChipBeforeWrite(run.session->port(), run.part, writeCheckFor(info.operation, identification.has_value(), options.force));
+            checkChipBeforeWrite(run.session->port(), run.part, check);
+        else if (check.chipMustAnswer && check.idMustMatch && !recordIdCheck(run.session->port(), run.part))
+            throw ToolFailure("the recording could not take its ID check");
     } catch (...) {
         run.session->abandon();
         throw;

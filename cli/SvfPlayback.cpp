@@ -73,6 +73,7 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
     context.chipName = chip;
     context.clockHz = options.clockHz;
     context.simFaults = options.simFaults;
+    context.allMismatches = options.allMismatches;
     const std::string& backingFile = options.port.path;
     const bool backingFileExisted = !backingFile.empty() && std::filesystem::exists(backingFile, error);
     const auto started = std::chrono::steady_clock::now();
@@ -97,6 +98,10 @@ int playRecording(const ToolOptions& options, const std::string& svfFile) {
         toolError(svfFile + ": " + result.mismatches[i].describe());
     if (mismatches > kMismatchesShown)
         toolError("... and " + counted(mismatches - kMismatchesShown, "more mismatch", "more mismatches"));
+    if (result.stoppedEarly)
+        toolError(svfFile + ": stopped at the first mismatch; nothing after line " +
+                  std::to_string(result.mismatches.front().line) +
+                  " was played (--all-mismatches plays on and reports every mismatch)");
     const std::string verdict = result.passed() ? "no mismatches" : counted(mismatches, "mismatch", "mismatches");
     toolInfo("Played " + svfFile + " on a simulated " + chip + ": " + counted(result.sdrCount, "scan", "scans") +
              ", " + std::to_string(result.comparedSdrs) + " compared, " + verdict + ".");

@@ -36,6 +36,8 @@ struct PortContext {
     std::string chipName;
     std::optional<std::uint32_t> clockHz;
     std::vector<std::string> simFaults;
+    // play: go on past the first mismatch and report every one.
+    bool allMismatches = false;
 };
 
 class Port {

@@ -63,7 +63,7 @@ svf::SvfPlayResult playOnBoard(const PortAddress& address, const PortContext& co
     const jtag::BoardSettings settings = jtag::boardFor(bridge, board);
     auto flash = openFlash(board, context);
     jtag::BoardModel model(*flash, settings);
-    jtag::BoardSvfPlayer player(model);
+    jtag::BoardSvfPlayer player(model, !context.allMismatches);
     return player.playFile(svfFile);
 }
 
@@ -75,6 +75,7 @@ svf::SvfPlayResult playOnSimulator(const PortAddress& address, const PortContext
     auto flash = openFlash(address, context);
     svf::SvfPlayerOptions options;
     if (context.clockHz) options.spiClockHz = *context.clockHz;
+    options.stopAtFirstMismatch = !context.allMismatches;
     svf::SvfPlayer player(*flash, options);
     return player.playFile(svfFile);
 }

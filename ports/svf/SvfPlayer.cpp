@@ -58,7 +58,13 @@ SvfPlayResult SvfPlayer::play(SvfParser& parser) {
     reset();
     SvfPlayResult result;
     SvfStatement statement;
-    while (parser.next(statement)) playStatement(statement, result);
+    while (parser.next(statement)) {
+        playStatement(statement, result);
+        if (options_.stopAtFirstMismatch && !result.mismatches.empty()) {
+            result.stoppedEarly = parser.next(statement);
+            break;
+        }
+    }
     return result;
 }
 

@@ -27,6 +27,9 @@ struct SvfPlayerOptions {
     // The SPI clock: each shifted bit costs the flash one period of it.
     // RUNTEST clock counts use it too unless the file sets a FREQUENCY.
     std::uint32_t spiClockHz = 50'000'000;
+    // Stop at the first mismatch, as a production player does: what comes
+    // after it was recorded for a chip this one is not (or is no longer).
+    bool stopAtFirstMismatch = true;
 };
 
 // One SDR whose captured bits differ from TDO under MASK.
@@ -52,6 +55,8 @@ struct SvfPlayResult {
     std::uint64_t busNanoseconds = 0;
     std::uint64_t waitNanoseconds = 0;
     std::vector<SvfMismatch> mismatches;
+    // The statements after the first mismatch were not played.
+    bool stoppedEarly = false;
 
     bool passed() const { return mismatches.empty(); }
 };

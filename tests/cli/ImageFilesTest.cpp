@@ -92,5 +92,23 @@ TEST_F(ToolTest, ProgramKeepsWhatTheImageDoesNotCover) {
     EXPECT_TRUE(has(ok(kSim + Args{"--offset", "0x10000", "program", "app.bin"}).out, "0 blocks erased"));
 }
 
+// A recording opens with the chip's ID check: played on another chip it
+// stops there, before its erase, and the chip keeps its data.
+TEST_F(ToolTest, ARecordingForAnotherChipStopsBeforeItsErase) {
+    write("image.bin", randomBytes(4096, 51));
+    write("old.bin", randomBytes(4096, 52));
+    ok({"--part", "W25Q16JV", "--port", "svf:job.svf", "program", "image.bin", "-e"});
+    EXPECT_TRUE(has(read("job.svf"), "Checking the chip's JEDEC ID (EF4015)"));
+    const Args other{"--part", "W25Q32JV", "--port", "sim:other.sim"};
+    ok(other + Args{"program", "old.bin", "-e"});
+    const std::string before = read("other.sim");
+    const Result played = run(other + Args{"play", "job.svf"});
+    EXPECT_EQ(played.status, 1) << played.text();
+    EXPECT_TRUE(has(played.err, "stopped at the first mismatch")) << played.text();
+    EXPECT_TRUE(read("other.sim") == before) << "the chip's data did not survive";
+    // On the chip it was made for it plays through.
+    EXPECT_TRUE(has(ok({"--part", "W25Q16JV", "--port", "sim:right.sim", "play", "job.svf"}).out, "no mismatches"));
+}
+
 }  // namespace
 }  // namespace vorant::cli::test

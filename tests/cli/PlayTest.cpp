@@ -19,12 +19,17 @@ TEST_F(ToolTest, PlayCountsScansAndMismatchesInTheSingularAndPlural) {
         std::string svf;
         for (int i = 0; i < c.reads; ++i) svf += kIdRead;
         write("id.svf", svf);
-        const Result result = run({"--chip", c.chip, "play", "id.svf"});
+        const Result result = run({"--chip", c.chip, "--all-mismatches", "play", "id.svf"});
         EXPECT_EQ(result.status, c.status) << result.text();
         EXPECT_TRUE(has(result.out, "Played id.svf on a simulated " + std::string(c.chip) + c.verdict)) << result.text();
         // Each mismatch on a line of its own, then the run's summary.
         EXPECT_EQ(result.errLines().size(), (c.status == 0 ? 0u : static_cast<std::size_t>(c.reads)) + 1) << result.text();
     }
+    // By default the first mismatch ends the play, and says so.
+    const Result first = run({"--chip", "W25Q16JV", "play", "id.svf"});
+    EXPECT_EQ(first.status, 1);
+    EXPECT_TRUE(has(first.out, ": 1 scan, 1 compared, 1 mismatch.")) << first.text();
+    EXPECT_TRUE(has(first.err, "stopped at the first mismatch; nothing after line")) << first.text();
 }
 
 }  // namespace

@@ -97,7 +97,7 @@ TEST(SvfParser, TakesAScanOfTheLongestLength) {
     EXPECT_EQ(statements[0].scan.smask.size(), SvfParser::kMaxScanBits);
 }
 
-TEST(SvfPlayer, ReportsEveryMismatchWithItsLine) {
+TEST(SvfPlayer, StopsAtTheFirstMismatchOrReportsEveryOneWithItsLine) {
     sim::FlashConfig config;
     config.sizeBytes = 64 * 1024;
     config.jedecId[0] = 0xEF, config.jedecId[1] = 0x40, config.jedecId[2] = 0x18;
@@ -105,13 +105,24 @@ TEST(SvfPlayer, ReportsEveryMismatchWithItsLine) {
     // The ID read (9Fh) answers EF 40 18. Line 3 expects EF 40 19, lines 4
     // and 5 a wrong first byte (line 5 masks it), line 6 a wrong bit 17 of
     // a 20-bit read, past the last whole byte.
-    const SvfPlayResult result = SvfPlayer(flash).playText(
+    const std::string text =
         "// read the ID\n"
         "SDR 32 TDI (000000F9) TDO (1802F700) MASK (FFFFFF00);\n"
         "SDR 32 TDI (000000F9) TDO (9802F700);\n"
         "SDR 32 TDI (000000F9) TDO (1802F600) MASK (FFFFFF00);\n"
         "SDR 32 TDI (000000F9) TDO (1802F600) MASK (FFFF0000);\n"
-        "SDR 20 TDI (000F9) TDO (0F700) MASK (FFF00);\n");
+        "SDR 20 TDI (000F9) TDO (0F700) MASK (FFF00);\n";
+    // By default the first mismatch ends the play, as on a production player.
+    const SvfPlayResult first = SvfPlayer(flash).playText(text);
+    EXPECT_EQ(first.comparedSdrs, 2u);
+    ASSERT_EQ(first.mismatches.size(), 1u);
+    EXPECT_EQ(first.mismatches[0].line, 3u);
+    EXPECT_TRUE(first.stoppedEarly);
+
+    SvfPlayerOptions every;
+    every.stopAtFirstMismatch = false;
+    const SvfPlayResult result = SvfPlayer(flash, every).playText(text);
+    EXPECT_FALSE(result.stoppedEarly);
     EXPECT_EQ(result.comparedSdrs, 5u);
     std::string described;
     for (const SvfMismatch& mismatch : result.mismatches) described += mismatch.describe() + "\n";

@@ -58,6 +58,10 @@ void BoardSvfPlayer::play(std::istream& in, svf::SvfPlayResult& result) {
     while (parser.next(statement)) {
         ++result.statements;
         playStatement(statement, result);
+        if (stopAtFirstMismatch_ && !result.mismatches.empty()) {
+            result.stoppedEarly = parser.next(statement);
+            break;
+        }
     }
 }
 

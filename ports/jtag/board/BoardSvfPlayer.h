@@ -16,7 +16,9 @@ namespace vorant::ports::jtag {
 
 class BoardSvfPlayer {
 public:
-    explicit BoardSvfPlayer(BoardModel& board) : board_(board) {}
+    // stopAtFirstMismatch: as svf::SvfPlayerOptions says.
+    explicit BoardSvfPlayer(BoardModel& board, bool stopAtFirstMismatch = true)
+        : board_(board), stopAtFirstMismatch_(stopAtFirstMismatch) {}
 
     // Checks the whole file first: a malformed one throws SvfParseError
     // and plays nothing. A file that cannot be read throws SvfError.
@@ -29,6 +31,7 @@ private:
     void playScan(const svf::SvfStatement& statement, svf::SvfPlayResult& result);
 
     BoardModel& board_;
+    bool stopAtFirstMismatch_;
     // The header and trailer bits of each scan kind (HDR, HIR, TDR, TIR).
     svf::SvfScan headerDr_, headerIr_, trailerDr_, trailerIr_;
 };
