@@ -82,7 +82,7 @@ struct ParsedValues {
     std::string format;
     bool dataWidthGiven = false, clockGiven = false, offsetGiven = false;
     bool debug = false, quiet = false, version = false, force = false;
-    bool noErase = false, noVerify = false, eraseWholeBlocks = false, allMismatches = false;
+    bool noErase = false, noVerify = false, eraseWholeBlocks = false, allMismatches = false, wholeSpan = false;
     std::vector<std::string> simFaults;
     // Every key of the port table's rows, also accepted as --KEY VALUE.
     std::map<std::string, std::string> portKeys;
@@ -129,6 +129,9 @@ void defineOptions(CLI::App& app, ParsedValues& values) {
                  "their other bytes)");
     app.add_flag("--all-mismatches", values.allMismatches,
                  "play: go on past the first TDO mismatch and report every one (default: stop at the first)");
+    app.add_flag("--whole-span", values.wholeSpan,
+                 "verify, checksum: every page from address 0 to the image's end, holes included (default: only "
+                 "the bytes the image holds)");
     app.add_flag("--debug", values.debug, "Show debug traces");
     app.add_flag("--quiet", values.quiet, "Show only errors: no status lines, progress or summary");
     // The ports' own keys: the tool knows them only from the port table.
@@ -245,6 +248,7 @@ ToolOptions toolOptions(const ParsedValues& values) {
     options.noVerify = values.noVerify;
     options.eraseWholeBlocks = values.eraseWholeBlocks;
     options.allMismatches = values.allMismatches;
+    options.wholeSpan = values.wholeSpan;
     options.simFaults = values.simFaults;
     return options;
 }

@@ -30,6 +30,7 @@ struct ToolOptions {
     // blocks the image covers only in part.
     bool noErase = false, noVerify = false, eraseWholeBlocks = false;
     bool allMismatches = false;  // play: report every mismatch, not stop at the first
+    bool wholeSpan = false;      // verify, checksum: every page from address 0, holes included
     std::vector<std::string> simFaults;
     formats::ImageOptions image;  // --format and --offset
 

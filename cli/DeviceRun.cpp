@@ -155,7 +155,16 @@ bool programsBlocks(const OperationRequest& request, const ToolOptions& options)
 }
 
 UT_CMDARGS deviceArguments(const OperationRequest& request, const ToolOptions& options) {
-    if (request.info->operation != Operation::Program) return request.deviceArguments();
+    const Operation operation = request.info->operation;
+    // Verify and checksum cover what the image holds unless asked for the
+    // span from address 0; the checksum is then the image's own CRC.
+    if ((operation == Operation::Verify || operation == Operation::Checksum) && !options.wholeSpan) {
+        std::vector<std::string> tokens = request.operands;
+        tokens.insert(tokens.end(), request.switchTokens.begin(), request.switchTokens.end());
+        tokens.push_back("-ranges");
+        return UT_CMDARGS(tokens);
+    }
+    if (operation != Operation::Program) return request.deviceArguments();
     std::vector<std::string> tokens = request.operands;
     tokens.insert(tokens.end(), request.switchTokens.begin(), request.switchTokens.end());
     if (!options.noVerify && !hasSwitch(request, {"-v", "-verify"})) tokens.push_back("-v");

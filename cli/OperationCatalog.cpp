@@ -21,7 +21,7 @@ std::vector<OperationInfo> buildCatalog() {
          "compare the flash with FILE (-v: without the status display)", K::ImageFile,
          {kVerify, kVerifyLong}, true, true, "verify"},
         {O::Checksum, "checksum", "checksum FILE [-v|-verify]",
-         "CRC-32 of FILE and of the flash over the range FILE covers", K::ImageFile,
+         "CRC-32 of the bytes FILE holds and of the flash there (--whole-span: every byte from address 0)", K::ImageFile,
          {kVerify, kVerifyLong}, true, false, ""},
         {O::Erase, "erase", "erase [-e|-erase] [-qebit]",
          "erase the whole flash (-e: without the status display; -qebit: clear Quad Enable)", K::None,

@@ -30,6 +30,9 @@ bool Type1SPIDevice::verify(int index, UT_CMDARGS* args, const char* operation) 
     // display to program.
     const bool showStatus = !(switchGiven(args, "-v") || switchGiven(args, "-verify"));
     const char* operationName = checksumMode ? "Checksum" : "Verification";
+    // "-ranges": only the bytes the data hold, read where they lie, instead
+    // of every page from address 0 (holes included).
+    const bool ranges = switchGiven(args, "-ranges");
 
     ConfigDataReader* reader = getConfigData();
     if (reader == nullptr) {
@@ -67,7 +70,10 @@ bool Type1SPIDevice::verify(int index, UT_CMDARGS* args, const char* operation) 
 
     const char* chunk = nullptr;
     int readerAddress = 0;
-    int delivered = reader->next(&chunk, &readerAddress, pageSize_);
+    auto nextChunk = [&] {
+        return ranges ? reader->nextPiece(&chunk, &readerAddress, pageSize_) : reader->next(&chunk, &readerAddress, pageSize_);
+    };
+    int delivered = nextChunk();
     while (delivered > 0 && !cancelled) {
         // Only the bits delivered are compared: a short last chunk reads and
         // compares a short page.
@@ -75,7 +81,8 @@ bool Type1SPIDevice::verify(int index, UT_CMDARGS* args, const char* operation) 
         reference = std::make_unique<RLBitVec>(bytes, static_cast<std::size_t>(delivered));
         capture = std::make_unique<RLBitVec>(bytes, static_cast<std::size_t>(delivered));
 
-        bool read = readCommand.open(port(), address, "//Loading device with 'read ' instruction.\n");
+        const unsigned readAt = ranges ? static_cast<unsigned>(readerAddress) : address;
+        bool read = readCommand.open(port(), readAt, "//Loading device with 'read ' instruction.\n");
         read = port().shift(ScanStage::kCaptureClose, capture.get(), &dataTdiMask, capture.get(), &dataTdoMask) &&
                read;
         // The capture starts as a copy of the file's page, so a page that was
@@ -97,7 +104,7 @@ bool Type1SPIDevice::verify(int index, UT_CMDARGS* args, const char* operation) 
         }
 
         cancelled = port().isCancelled(2);
-        delivered = reader->next(&chunk, &readerAddress, pageSize_);
+        delivered = nextChunk();
     }
     // A cancel that came after the last chunk left nothing unread.
     const bool stoppedEarly = cancelled && delivered > 0;
@@ -108,9 +115,14 @@ bool Type1SPIDevice::verify(int index, UT_CMDARGS* args, const char* operation) 
         DEVICE_MESSAGE().issueStatus("'%d': %s cancelled.\n", index, operationName);
         result = false;
     } else if (checksumMode) {
-        DEVICE_MESSAGE().issueStatus(
-            "All Checksum calculations are performed on the address range spanned by the configuration "
-            "file.\n");
+        if (ranges)
+            DEVICE_MESSAGE().issueStatus(
+                "All Checksum calculations are performed on the bytes the configuration file holds, in address order "
+                "(its gaps left out).\n");
+        else
+            DEVICE_MESSAGE().issueStatus(
+                "All Checksum calculations are performed on the address range spanned by the configuration "
+                "file.\n");
         result = rowChecksum(index, reference.get(), 0, capture.get(), 0, true, firstSum, secondSum, 0, 0) &&
                  result;
     } else {
