@@ -1,6 +1,7 @@
 #include "formats/FlashImage.h"
 
 #include "formats/FormatError.h"
+#include "formats/HexText.h"
 
 #include <algorithm>
 #include <cstdio>
@@ -9,16 +10,6 @@
 #include <string>
 
 namespace vorant::formats {
-
-namespace {
-
-std::string hexAddress(std::uint64_t address) {
-    char text[24];
-    std::snprintf(text, sizeof text, "0x%llX", static_cast<unsigned long long>(address));
-    return text;
-}
-
-}  // namespace
 
 FlashImage::FlashImage(std::vector<unsigned char> bytes)
     : FlashImage(std::vector<ImageRange>{ImageRange{0, std::move(bytes)}}) {}
@@ -29,8 +20,8 @@ FlashImage::FlashImage(std::vector<ImageRange> ranges) {
     for (ImageRange& range : ranges) {
         if (range.bytes.empty()) continue;
         if (!ranges_.empty() && range.address < ranges_.back().end())
-            throw FormatError("the data at " + hexAddress(range.address) + " overlap the data at " +
-                              hexAddress(ranges_.back().address) + ".." + hexAddress(ranges_.back().end() - 1));
+            throw FormatError("the data at " + hexNumber(range.address) + " overlap the data at " +
+                              hexNumber(ranges_.back().address) + ".." + hexNumber(ranges_.back().end() - 1));
         if (!ranges_.empty() && range.address == ranges_.back().end()) {
             std::vector<unsigned char>& joined = ranges_.back().bytes;
             joined.insert(joined.end(), range.bytes.begin(), range.bytes.end());
@@ -39,7 +30,7 @@ FlashImage::FlashImage(std::vector<ImageRange> ranges) {
         }
     }
     if (byteSize() > kMaxBytes)
-        throw FormatError("an image reaching " + hexAddress(byteSize()) +
+        throw FormatError("an image reaching " + hexNumber(byteSize()) +
                           " is larger than the largest supported image (" + std::to_string(kMaxBytes) + " bytes)");
 }
 

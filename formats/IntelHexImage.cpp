@@ -2,6 +2,7 @@
 
 #include "formats/AddressRanges.h"
 #include "formats/FormatError.h"
+#include "formats/HexText.h"
 #include "formats/InputFile.h"
 
 #include <algorithm>
@@ -21,19 +22,6 @@ enum RecordType : unsigned char {
     kExtendedLinearAddress = 0x04,
     kStartLinearAddress = 0x05,
 };
-
-int hexDigitValue(char c) {
-    if (c >= '0' && c <= '9') return c - '0';
-    if (c >= 'A' && c <= 'F') return c - 'A' + 10;
-    if (c >= 'a' && c <= 'f') return c - 'a' + 10;
-    return -1;
-}
-
-std::string hexNumber(std::uint64_t value, int digits) {
-    char text[32];
-    std::snprintf(text, sizeof text, "0x%0*llX", digits, static_cast<unsigned long long>(value));
-    return text;
-}
 
 std::string describeCharacter(char c) {
     const auto code = static_cast<unsigned char>(c);

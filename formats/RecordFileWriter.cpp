@@ -1,21 +1,12 @@
 #include "formats/RecordFileWriter.h"
 
 #include "formats/BitReversal.h"
+#include "formats/HexText.h"
 
 #include <algorithm>
 #include <cstdio>
 
 namespace vorant::formats {
-
-namespace {
-
-std::string hexNumber(std::uint64_t value) {
-    char text[24];
-    std::snprintf(text, sizeof text, "0x%08llX", static_cast<unsigned long long>(value));
-    return text;
-}
-
-}  // namespace
 
 RecordFileWriter::RecordFileWriter(const std::string& target, std::size_t recordBytes, std::string formatName)
     : AtomicFileWriter(target), recordBytes_(recordBytes), formatName_(std::move(formatName)) {
@@ -34,8 +25,8 @@ bool RecordFileWriter::writeData(const unsigned char* data, int offset, int bits
     if (count == 0) return true;
     auto address = static_cast<std::uint64_t>(offset);
     if (address < nextAddress_) {
-        return fail(targetName() + ": data at " + hexNumber(address) + " arrive below data already written (up to " +
-                    hexNumber(nextAddress_ - 1) + "); " + formatName_ + " output takes data in ascending order");
+        return fail(targetName() + ": data at " + hexNumber(address, 8) + " arrive below data already written (up to " +
+                    hexNumber(nextAddress_ - 1, 8) + "); " + formatName_ + " output takes data in ascending order");
     }
     if (!acceptRange(address, count)) return false;
     if (address != nextAddress_) flushRecord();

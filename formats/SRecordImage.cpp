@@ -2,6 +2,7 @@
 
 #include "formats/AddressRanges.h"
 #include "formats/FormatError.h"
+#include "formats/HexText.h"
 #include "formats/InputFile.h"
 
 #include <cstdio>
@@ -9,19 +10,6 @@
 
 namespace vorant::formats {
 namespace {
-
-int hexDigitValue(char c) {
-    if (c >= '0' && c <= '9') return c - '0';
-    if (c >= 'A' && c <= 'F') return c - 'A' + 10;
-    if (c >= 'a' && c <= 'f') return c - 'a' + 10;
-    return -1;
-}
-
-std::string hexAddress(std::uint64_t value) {
-    char text[24];
-    std::snprintf(text, sizeof text, "0x%llX", static_cast<unsigned long long>(value));
-    return text;
-}
 
 // Address bytes of each record type; 0 for the reserved S4.
 constexpr int kAddressBytes[10] = {2, 2, 3, 4, 0, 2, 3, 4, 3, 2};
@@ -114,9 +102,9 @@ private:
         if (count == 0) return;
         const std::uint64_t end = address + count;
         if (end > maxImageBytes_)
-            fail(lineNumber_, "data at " + hexAddress(address) + " reach past " + hexAddress(maxImageBytes_));
+            fail(lineNumber_, "data at " + hexNumber(address) + " reach past " + hexNumber(maxImageBytes_));
         if (covered_.overlaps(address, end))
-            fail(lineNumber_, "data at " + hexAddress(address) + " overlap data of an earlier record");
+            fail(lineNumber_, "data at " + hexNumber(address) + " overlap data of an earlier record");
         covered_.add(address, end);
         const auto first = bytes_.begin() + static_cast<std::ptrdiff_t>(dataStart);
         if (!ranges_.empty() && ranges_.back().end() == address) {

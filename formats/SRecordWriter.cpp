@@ -1,6 +1,7 @@
 #include "formats/SRecordWriter.h"
 
 #include "formats/ConfigDataFiles.h"
+#include "formats/HexText.h"
 
 #include <algorithm>
 #include <cstdio>
@@ -12,12 +13,6 @@ constexpr char kHexDigits[] = "0123456789ABCDEF";
 constexpr std::size_t kRecordBytes = 32;
 constexpr std::size_t kTextFlushSize = 64 * 1024;
 constexpr char kHeader[] = "vorant-spi readback";
-
-std::string hexNumber(std::uint64_t value) {
-    char text[24];
-    std::snprintf(text, sizeof text, "0x%llX", static_cast<unsigned long long>(value));
-    return text;
-}
 
 int dataTypeOf(const std::string& path) {
     const std::string extension = lowerCaseExtension(path);

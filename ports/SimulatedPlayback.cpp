@@ -5,7 +5,7 @@
 #include "ports/jtag/BridgeKeys.h"
 #include "ports/jtag/board/BoardPort.h"
 #include "ports/jtag/board/BoardSvfPlayer.h"
-#include "ports/sim/FaultOption.h"
+#include "ports/sim/SimPort.h"
 #include "ports/svf/SvfRecorder.h"
 
 #include <fstream>
@@ -14,20 +14,9 @@ namespace vorant::ports {
 
 namespace {
 
-[[noreturn]] void refuse(const std::string& message) { throw PortError(PortError::Kind::BadRequest, message); }
-
 // The part's flash with the context's faults and the address's file.
 std::unique_ptr<sim::FlashModel> openFlash(const PortAddress& address, const PortContext& context) {
-    sim::FaultPlan faults;
-    sim::FlashConfig config;
-    try {
-        faults = sim::faultPlan(context.simFaults);
-        config = sim::FlashConfig::fromPartDatabase(context.chipName);
-    } catch (const sim::FaultOptionError& error) {
-        refuse(error.what());
-    } catch (const VorantException& error) {
-        refuse(std::string(error.what()) + "; choose another chip with --chip NAME");
-    }
+    const auto [config, faults] = sim::simulatedChip(context);
     // A flash file that does not fit is the caller's VorantException.
     return std::make_unique<sim::FlashModel>(config, faults, address.path);
 }

@@ -18,19 +18,21 @@ namespace {
 
 }  // namespace
 
-SimPort::SimPort(const std::string& backingFile, const ports::PortContext& context) {
-    FaultPlan faults;
+SimulatedChip simulatedChip(const ports::PortContext& context) {
+    SimulatedChip chip;
     try {
-        faults = faultPlan(context.simFaults);
+        chip.faults = faultPlan(context.simFaults);
+        chip.config = FlashConfig::fromPartDatabase(context.chipName);
     } catch (const FaultOptionError& error) {
         refuse(error.what());
-    }
-    FlashConfig config;
-    try {
-        config = FlashConfig::fromPartDatabase(context.chipName);
     } catch (const VorantException& error) {
         refuse(std::string(error.what()) + "; choose another chip with --chip NAME");
     }
+    return chip;
+}
+
+SimPort::SimPort(const std::string& backingFile, const ports::PortContext& context) {
+    const auto [config, faults] = simulatedChip(context);
     std::error_code error;
     const bool fileExisted = !backingFile.empty() && std::filesystem::exists(backingFile, error);
     try {

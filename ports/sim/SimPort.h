@@ -12,6 +12,14 @@
 
 namespace vorant::sim {
 
+// The chip a port plays: context.chipName's configuration and the
+// context's faults. Throws PortError (BadRequest) naming what is wrong.
+struct SimulatedChip {
+    FlashConfig config;
+    FaultPlan faults;
+};
+SimulatedChip simulatedChip(const ports::PortContext& context);
+
 class SimPort final : public ports::Port {
 public:
     // Plays context.chipName with the context's faults and clock. Throws

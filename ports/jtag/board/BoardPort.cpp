@@ -5,6 +5,7 @@
 #include "ports/sim/FlashFileAdvice.h"
 #include "ports/jtag/BridgeKeys.h"
 #include "ports/sim/FaultOption.h"
+#include "ports/sim/SimPort.h"
 
 #include <filesystem>
 #include <stdexcept>
@@ -43,16 +44,7 @@ BoardSettings boardFor(const BridgeSettings& bridge, const PortAddress& address)
 BoardPort::BoardPort(const PortAddress& address, const PortContext& context) {
     const BridgeSettings bridge = bridgeSettings(address, "jtagspi");
     const BoardSettings boardSettings = boardFor(bridge, address);
-    sim::FaultPlan faults;
-    sim::FlashConfig config;
-    try {
-        faults = sim::faultPlan(context.simFaults);
-        config = sim::FlashConfig::fromPartDatabase(context.chipName);
-    } catch (const sim::FaultOptionError& error) {
-        refuse(error.what());
-    } catch (const VorantException& error) {
-        refuse(std::string(error.what()) + "; choose another chip with --chip NAME");
-    }
+    const auto [config, faults] = sim::simulatedChip(context);
     // The board's chip takes its faults; the simulator port's own (failing
     // calls, a lost cable, a cancel) have no place on a board.
     if (faults.failShiftAt || faults.failAllShifts || faults.failWaitAt || faults.failAllWaits ||
