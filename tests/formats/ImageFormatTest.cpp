@@ -119,20 +119,6 @@ TEST(SparseImage, MemoryFollowsTheDataAndPagesFillTheHoles) {
     EXPECT_THROW(FlashImage(std::vector<ImageRange>{{0, Bytes(4)}, {3, Bytes(1)}}), FormatError);
 }
 
-TEST(SparseImage, ABinaryImageStartsAtItsOffset) {
-    ScratchDirectory dir;
-    writeFile(dir.file("boot.bin"), Bytes{1, 2, 3});
-    ImageOptions at;
-    at.offset = 0x10000;
-    const FlashImage image = loadFlashImage(dir.file("boot.bin"), at);
-    ASSERT_EQ(image.ranges().size(), 1u);
-    EXPECT_EQ(image.ranges()[0].address, 0x10000u);
-    EXPECT_EQ(image.byteSize(), 0x10003u);
-    writeFile(dir.file("boot.hex"), std::string(":0100020042BB\n:00000001FF\n"));
-    EXPECT_NE(formatErrorOf([&] { loadFlashImage(dir.file("boot.hex"), at); }).find("carry their own addresses"),
-              std::string::npos);
-}
-
 TEST(SRecords, OurWriterWritesOneTypeWithCountAndEnd) {
     ScratchDirectory dir;
     Bytes flash(40);

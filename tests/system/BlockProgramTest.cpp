@@ -114,20 +114,6 @@ TEST(BlockProgram, TheLargestErasesThatFitAndNoneForBlocksThatHoldTheData) {
     EXPECT_TRUE(std::equal(image.begin(), image.end(), rig.flash().begin()));
 }
 
-TEST(BlockProgram, AnUnalignedImageUsesEverySize) {
-    BlockRig rig;
-    const Bytes image = randomImage(100 * K, 6);
-    rig.useRanges({{0x1000, image}});  // 0x1000..0x1A000
-    ASSERT_TRUE(rig.programBlocks()) << rig.messages.transcript();
-    // 4 KiB blocks up to 0x8000, 32 KiB blocks at 0x8000 and 0x10000 (a
-    // 64 KiB block at 0x10000 would reach past 0x1A000), 4 KiB blocks to
-    // the end.
-    EXPECT_EQ(rig.erases(32 * K), 2u);
-    EXPECT_EQ(rig.erases(64 * K), 0u);
-    EXPECT_EQ(rig.erases(4 * K), 7u + 2u);
-    EXPECT_TRUE(std::equal(image.begin(), image.end(), rig.flash().begin() + 0x1000));
-}
-
 TEST(BlockProgram, AFailedEraseWritesNoPageAndAStuckBitFailsTheVerify) {
     {
         sim::FaultPlan stuck;
