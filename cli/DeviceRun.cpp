@@ -193,6 +193,7 @@ bool invoke(Type1SPIDevice& device, const OperationRequest& request, const ToolO
     case Operation::QuadEnable: return device.writeQuadEnableBit(index, &args, request.operands.at(0) == "set");
     case Operation::Sfdp: return showSfdp(*device.getScanPort());  // the tool reads it, not the plug-in
     case Operation::Parts:
+    case Operation::Ports:
     case Operation::Play: break;
     }
     return false;

@@ -49,6 +49,8 @@ std::vector<OperationInfo> buildCatalog() {
          "list the part database (PATTERN: '*' and '?' wildcards, any case; --vendor: part of the name)",
          K::OptionalPattern, {kVendor, kSize, kId},
          false, false, ""},
+        {O::Ports, "ports", "ports", "list the cables found on this machine: spidev nodes, FTDI and CH341A devices",
+         K::None, {}, false, false, ""},
         {O::Play, "play", "play FILE.svf",
          "play a recorded SVF file on the simulated flash and report mismatches", K::SvfFile, {}, false,
          false, ""},

@@ -7,7 +7,7 @@ namespace vorant::cli {
 
 enum class Operation {
     Program, Verify, Checksum, Erase, BlankCheck, Readback, IdCode, Signature,
-    Validate, Status, Release, Unlock, QuadEnable, Sfdp, Parts, Play,
+    Validate, Status, Release, Unlock, QuadEnable, Sfdp, Parts, Ports, Play,
 };
 
 // What an operation takes besides its switches.
@@ -33,7 +33,7 @@ struct OperationInfo {
     std::string_view purpose;    // one line for --help
     OperandKind operand;
     std::vector<SwitchInfo> switches;
-    // Needs a device (and so a part and a port); false for parts and play.
+    // Needs a device (and so a part and a port); false for parts, ports and play.
     bool needsDevice = true;
     // Meaningful on a recording port: everything the operation decides
     // happens on the flash when the file is played. Operations that answer

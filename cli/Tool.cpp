@@ -10,6 +10,7 @@
 #include "cli/UsageError.h"
 #include "host/MessageSinks.h"
 #include "host/OutputTarget.h"
+#include "ports/PortError.h"
 #include "ports/PortTable.h"
 
 #include <csignal>
@@ -49,10 +50,30 @@ int listParts(const OperationRequest& request) {
     return kExitSuccess;
 }
 
+// Every cable the port table's rows find, one line each. A kind that
+// cannot look (no permission to list USB devices) says so and the others
+// still report.
+int listPorts() {
+    std::string lines;
+    for (const ports::PortInfo& row : ports::portTable()) {
+        if (row.discover == nullptr) continue;
+        try {
+            for (const ports::FoundCable& cable : row.discover())
+                lines += "  " + cable.address + std::string(cable.address.size() < 28 ? 28 - cable.address.size() : 1, ' ') +
+                         cable.description + "\n";
+        } catch (const ports::PortError& error) {
+            printToolError(error.what());
+        }
+    }
+    std::fputs(lines.empty() ? "nothing found\n" : lines.c_str(), stdout);
+    return kExitSuccess;
+}
+
 int runOperation(const CommandLine& command, ProgressAwareSink& sink) {
     loadPartDatabase(command.options.partFiles);
     switch (command.request.info->operation) {
     case Operation::Parts: return listParts(command.request);
+    case Operation::Ports: return listPorts();
     case Operation::Play: return playRecording(command.options, command.request.fileOperand());
     default: return runDeviceOperation(command.options, command.request, sink);
     }

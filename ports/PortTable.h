@@ -19,6 +19,12 @@ struct PortKey {
     std::string purpose;
 };
 
+// A cable found on this machine, for `vorant-spi ports`.
+struct FoundCable {
+    std::string address;      // a --port value that opens it
+    std::string description;  // what it is: "FT232H, serial FT4ABC12"
+};
+
 enum class PathUse { None, Optional, Required };
 
 struct PortInfo {
@@ -38,6 +44,9 @@ struct PortInfo {
     // what the SVF player throws for a file it cannot play.
     svf::SvfPlayResult (*playSvf)(const PortAddress& address, const PortContext& context,
                                   const std::string& svfFile) = nullptr;
+    // Lists the cables of this kind on this machine; null for a port that
+    // has none to find. Throws PortError when it cannot look.
+    std::vector<FoundCable> (*discover)() = nullptr;
 
     bool takesKey(const std::string& key) const {
         for (const PortKey& known : keys)

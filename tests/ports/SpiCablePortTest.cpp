@@ -1,0 +1,121 @@
+// The scan port every SPI cable shares, on a bus that logs each
+// transaction as hex segments ("9F >3": 9Fh sent, then three bytes read)
+// and answers reads from a script. What a cable's own bus makes of these
+// is its own test; this is the framing and the byte order of the bytes.
+
+#include "host/RLBitVec.h"
+#include "host/ScanPort.h"
+#include "ports/spi/SpiCablePort.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdio>
+#include <string>
+#include <vector>
+
+namespace vorant::ports::spi::test {
+namespace {
+
+class LoggingBus final : public SpiBus {
+public:
+    std::vector<std::string> log;
+    std::vector<std::uint8_t> answer;  // what every read returns, from its first byte
+    bool failTransact = false, gone = false;
+
+    bool transact(std::span<const SpiSegment> segments) override {
+        if (failTransact) return false;
+        std::string line = "tx";
+        for (const SpiSegment& segment : segments) {
+            line += " ";
+            if (segment.miso != nullptr) {
+                line += ">" + std::to_string(segment.length);
+                for (std::size_t i = 0; i < segment.length; ++i) segment.miso[i] = i < answer.size() ? answer[i] : 0xFF;
+                continue;
+            }
+            for (std::size_t i = 0; i < segment.length; ++i) {
+                char hex[3];
+                std::snprintf(hex, sizeof hex, "%02X", segment.mosi[i]);
+                line += hex;
+            }
+        }
+        log.push_back(line);
+        return true;
+    }
+    bool flush() override {
+        log.push_back("flush");
+        return !gone;
+    }
+    bool pause(std::uint64_t us) override {
+        log.push_back("pause " + std::to_string(us));
+        return true;
+    }
+    std::string error() const override { return gone ? "the device is gone" : "bulk write failed"; }
+    bool lost() const override { return gone; }
+};
+
+RLBitVec wireBytes(std::vector<unsigned char> bytes) { return RLBitVec(bytes.data(), bytes.size() * 8); }
+
+class SpiCablePortTest : public ::testing::Test {
+protected:
+    bool send(int stage, std::vector<unsigned char> bytes) {
+        RLBitVec tdi = wireBytes(std::move(bytes));
+        return port.shiftWrite(stage, &tdi, 0);
+    }
+    LoggingBus bus;
+    SpiCablePort port{"cable", bus};
+};
+
+TEST_F(SpiCablePortTest, AnIdReadIsOneTransactionAndItsReplyLandsInScanOrder) {
+    bus.answer = {0xEF, 0x40, 0x18};
+    ASSERT_TRUE(send(ScanStage::kOpen, {0x9F}));
+    RLBitVec tdi(24, false), tdo(24, true), mask(24, false);
+    ASSERT_TRUE(port.shift(ScanStage::kCaptureClose, &tdi, nullptr, &tdo, &mask));
+    EXPECT_EQ(bus.log, std::vector<std::string>({"tx 9F >3"}));
+    const RLBitVec expected = wireBytes({0xEF, 0x40, 0x18});
+    EXPECT_EQ(std::vector<unsigned char>(tdo.data(), tdo.data() + 3),
+              std::vector<unsigned char>(expected.data(), expected.data() + 3));
+}
+
+// The unlock's status write is left open; the wait deselects it, puts it
+// on the wire, and only then lets its time pass.
+TEST_F(SpiCablePortTest, AWaitClosesFlushesThenPauses) {
+    ASSERT_TRUE(send(ScanStage::kWhole, {0x06}));
+    ASSERT_TRUE(send(ScanStage::kOpen, {0x01}));
+    ASSERT_TRUE(send(ScanStage::kContinue, {0x00, 0x02}));
+    ASSERT_TRUE(port.wait(15000, true));
+    ASSERT_TRUE(port.wait(0, true));
+    EXPECT_EQ(bus.log, std::vector<std::string>({"tx 06", "tx 01 0002", "flush", "pause 15000", "flush"}));
+    EXPECT_EQ(port.stats().transactions, 2u);
+}
+
+// A capture shorter than its shift fills only its own bits.
+TEST_F(SpiCablePortTest, AShortCaptureKeepsTheRestOfTdoClear) {
+    bus.answer = {0xFF};
+    ASSERT_TRUE(send(ScanStage::kOpen, {0x05}));
+    RLBitVec tdi(8, false), tdo(3, false);
+    ASSERT_TRUE(port.shift(ScanStage::kCaptureClose, &tdi, nullptr, &tdo, nullptr));
+    EXPECT_EQ(tdo.data()[0], 0x07);
+}
+
+TEST_F(SpiCablePortTest, FailuresAreRefusedWithTheirReason) {
+    RLBitVec odd(12, false);
+    EXPECT_FALSE(port.shiftWrite(ScanStage::kWhole, &odd, 0));
+    EXPECT_STREQ(port.failureReason(), "cable: a shift of 12 bits; an SPI cable moves whole bytes");
+    EXPECT_TRUE(bus.log.empty());
+
+    bus.failTransact = true;
+    EXPECT_FALSE(send(ScanStage::kWhole, {0x06}));
+    EXPECT_STREQ(port.failureReason(), "cable: bulk write failed");
+
+    bus.failTransact = false;
+    bus.gone = true;
+    EXPECT_FALSE(send(ScanStage::kWhole, {0x06}));
+    EXPECT_FALSE(port.wait(10, true));
+    EXPECT_TRUE(port.connectionLost());
+    EXPECT_TRUE(port.isCancelled(2));
+    EXPECT_STREQ(port.failureReason(), "cable: the device is gone");
+    EXPECT_EQ(bus.log, std::vector<std::string>({}));
+}
+
+}  // namespace
+}  // namespace vorant::ports::spi::test
