@@ -9,6 +9,7 @@ packages=(
   libtomlplusplus-dev libcli11-dev
   g++-mingw-w64-x86-64 binutils-mingw-w64-x86-64
   srecord openocd
+  libftdi1-dev libusb-1.0-0-dev
   clang-14 libclang-rt-14-dev
 )
 if [[ "${VORANT_WITH_WINE:-0}" == 1 ]]; then packages+=(wine wine64); fi
