@@ -52,6 +52,17 @@ const std::vector<PortInfo>& portTable() {
     return table;
 }
 
+const std::vector<std::string>& portsLeftOut() {
+    // Cables whose library this build could not link; each optional row
+    // above names itself here in its #else.
+    static const std::vector<std::string> names = {
+#if !VORANT_HAVE_OPENOCD
+        "openocd (needs POSIX sockets)",
+#endif
+    };
+    return names;
+}
+
 const PortInfo* findPort(const std::string& kind) {
     for (const PortInfo& row : portTable())
         if (row.name == kind) return &row;
@@ -79,6 +90,7 @@ std::string portHelp() {
             text += line + wrapped(key.purpose, kColumn, kWidth) + "\n";
         }
     }
+    for (const std::string& name : portsLeftOut()) text += "  (not in this build: " + name + ")\n";
     return text;
 }
 

@@ -56,6 +56,9 @@ struct PortInfo {
 };
 
 const std::vector<PortInfo>& portTable();
+// The cables this build leaves out, each with what it would need, so
+// --help can say why one is missing.
+const std::vector<std::string>& portsLeftOut();
 // The row of a kind; null when there is none.
 const PortInfo* findPort(const std::string& kind);
 // "sim, svf", for messages.
