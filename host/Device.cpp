@@ -1,5 +1,6 @@
 #include "Device.h"
 
+#include "BitReversal.h"
 #include "Port_MsgManData.h"
 #include "VorantException.h"
 
@@ -37,7 +38,7 @@ std::uint32_t foldVector(std::uint32_t crc, const RLBitVec* vector, int bits) {
     const std::size_t bytes = usable / 8;
     crc = ~crc;
     for (std::size_t i = 0; i < bytes; ++i)
-        crc = kCrcTable[(crc ^ SPIDevice::swapBits(vector->data()[i])) & 0xFFu] ^ (crc >> 8);
+        crc = kCrcTable[(crc ^ vorant::kReversedBits[vector->data()[i]]) & 0xFFu] ^ (crc >> 8);
     return ~crc;
 }
 
@@ -122,9 +123,4 @@ bool Device::rowChecksum(int index, RLBitVec* first, int firstBits, RLBitVec* se
 
 SPIDevice::SPIDevice(const char* partName) : Device(partName) {}
 
-unsigned char SPIDevice::swapBits(unsigned char value) {
-    value = static_cast<unsigned char>((value & 0xF0u) >> 4 | (value & 0x0Fu) << 4);
-    value = static_cast<unsigned char>((value & 0xCCu) >> 2 | (value & 0x33u) << 2);
-    value = static_cast<unsigned char>((value & 0xAAu) >> 1 | (value & 0x55u) << 1);
-    return value;
-}
+unsigned char SPIDevice::swapBits(unsigned char value) { return vorant::kReversedBits[value]; }

@@ -1,5 +1,7 @@
 #include "RLBitVec.h"
 
+#include "BitReversal.h"
+
 #include "VorantException.h"
 
 #include <algorithm>
@@ -8,19 +10,9 @@
 
 namespace {
 
-// Reverses the bit order of every byte value: a data byte sent MSB first
-// occupies its eight vector bits with the MSB at the lowest index, which is
-// the storage byte read backwards.
-constexpr std::array<unsigned char, 256> makeReverseTable() {
-    std::array<unsigned char, 256> table{};
-    for (unsigned v = 0; v < 256; ++v) {
-        unsigned r = 0;
-        for (int b = 0; b < 8; ++b) r |= ((v >> b) & 1u) << (7 - b);
-        table[v] = static_cast<unsigned char>(r);
-    }
-    return table;
-}
-constexpr auto kReverse = makeReverseTable();
+// A data byte sent MSB first occupies its eight vector bits with the MSB at
+// the lowest index, which is the storage byte read backwards.
+constexpr const auto& kReverse = vorant::kReversedBits;
 
 std::size_t bytesFor(std::size_t bits) { return (bits + 7) / 8; }
 
@@ -99,6 +91,13 @@ void RLBitVec::updateBitField(const char* bits, int start) {
 
 void RLBitVec::updateBitField(unsigned value, int start, int length, bool msbFirst) {
     requireField(start, length);
+    if (msbFirst && start % 8 == 0 && length % 8 == 0 && length <= 32) {
+        // A byte-aligned address (every page's): its bytes most significant
+        // first, each mirrored into storage order.
+        unsigned char* out = bytes_.data() + start / 8;
+        for (int k = 0; k < length / 8; ++k) out[k] = kReverse[(value >> (length - 8 - 8 * k)) & 0xFFu];
+        return;
+    }
     for (int k = 0; k < length; ++k) {
         const int valueBit = msbFirst ? length - 1 - k : k;
         const bool bit = valueBit < 32 && ((value >> valueBit) & 1u);
