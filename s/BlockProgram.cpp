@@ -8,7 +8,7 @@
 #include "s/BlockEraseTypes.h"
 #include "s/DeviceMessages.h"
 #include "s/ErasePlan.h"
-#include "s/ReadCommandFrame.h"
+#include "s/FlashReader.h"
 #include "s/Type1SPIDevice.h"
 
 #include "host/ConfigData.h"
@@ -37,26 +37,6 @@ bool allErased(const unsigned char* bytes, std::size_t count) {
 }
 
 }  // namespace
-
-bool Type1SPIDevice::readFlash(unsigned address, unsigned char* bytes, std::size_t count,
-                               const unsigned char* expected) {
-    const std::size_t pageBytes = static_cast<std::size_t>(pageSize_ / 8);
-    vorant::device::ReadCommandFrame readCommand(readInstruction_, readSize_, pageAddressStartIndex_, addressSize_);
-    RLBitVec pageOnes(static_cast<std::size_t>(pageSize_), true);
-    bool ok = true;
-    for (std::size_t done = 0; done < count && ok; done += pageBytes) {
-        const std::size_t take = std::min(pageBytes, count - done);
-        std::vector<unsigned char> want(take, 0);
-        if (expected != nullptr) std::memcpy(want.data(), expected + done, take);
-        // The expected bytes in the wire layout: what a recording compares,
-        // and what a cable overwrites with what it read.
-        RLBitVec capture(want.data(), take * 8);
-        ok = readCommand.open(port(), address + static_cast<unsigned>(done), "//Loading device with 'read' instruction.\n");
-        ok = port().shift(ScanStage::kCaptureClose, &capture, &pageOnes, &capture, &pageOnes) && ok;
-        for (std::size_t k = 0; k < take; ++k) bytes[done + k] = swapBits(capture.data()[k]);
-    }
-    return ok;
-}
 
 bool Type1SPIDevice::programBlocks(int index, UT_CMDARGS* args) {
     const bool fileMode = port().outputMode();
@@ -114,7 +94,9 @@ bool Type1SPIDevice::programBlocks(int index, UT_CMDARGS* args) {
 
     RLBitVec frame(static_cast<std::size_t>(totalShiftSize_), false);
     frame.updateBitField(pageProgramInstruction_.c_str(), 0);
-    std::vector<unsigned char> current, desired;
+    vorant::device::FlashReader flash(port(), readInstruction_, readSize_, pageAddressStartIndex_, addressSize_,
+                                      pageBytes);
+    std::vector<unsigned char> current, desired, covered;
     int erased = 0, unchanged = 0, pagesWritten = 0;
     bool cancelled = false;
 
@@ -132,24 +114,44 @@ bool Type1SPIDevice::programBlocks(int index, UT_CMDARGS* args) {
         const auto& type = types[step.sizeIndex];
         const auto block = static_cast<unsigned>(step.address);
         const std::size_t size = type.sizeBytes;
-        // What the block holds now; a recording cannot read, and erases.
-        current.assign(size, 0xFF);
-        if (!fileMode && !readFlash(block, current.data(), size, nullptr)) {
-            DEVICE_MESSAGE().issueError("'%d': Programming terminated, the block at address 0x%X could not be read.\n",
-                                        index, block);
-            spidisable(index, args);
-            return false;
-        }
-        desired = fileMode ? std::vector<unsigned char>(size, 0xFF) : current;
+        // What the block should hold: the data where they are, and around
+        // them what it holds now (a recording cannot read: it erases).
+        desired.assign(size, 0xFF);
+        covered.assign(size, 0);
         // Every piece lies in a planned block, and both come in ascending
         // order; a page-sized piece never crosses a block.
-        for (; piece.count > 0 && piece.address < block + size; nextPiece())
-            if (piece.address >= block)
-                std::memcpy(desired.data() + (piece.address - block), piece.bytes,
-                            std::min(piece.count, block + size - piece.address));
-        if (!fileMode && desired == current) {
-            ++unchanged;
-            continue;
+        for (; piece.count > 0 && piece.address < block + size; nextPiece()) {
+            if (piece.address < block) continue;
+            const std::size_t at = piece.address - block, n = std::min(piece.count, size - at);
+            std::memcpy(desired.data() + at, piece.bytes, n);
+            std::memset(covered.data() + at, 1, n);
+        }
+        current.assign(size, 0xFF);
+        if (!fileMode) {
+            // Read what must be kept, and the data's pages until one differs:
+            // after that a page the data fill wholly need not be read.
+            bool differs = false;
+            for (std::size_t offset = 0; offset < size; offset += pageBytes) {
+                const std::size_t end = std::min(size, offset + pageBytes);
+                if (differs && std::all_of(covered.begin() + static_cast<std::ptrdiff_t>(offset),
+                                           covered.begin() + static_cast<std::ptrdiff_t>(end),
+                                           [](unsigned char c) { return c != 0; }))
+                    continue;
+                if (!flash.read(block + static_cast<unsigned>(offset), current.data() + offset, end - offset)) {
+                    DEVICE_MESSAGE().issueError(
+                        "'%d': Programming terminated, the block at address 0x%X could not be read.\n", index, block);
+                    spidisable(index, args);
+                    return false;
+                }
+                for (std::size_t k = offset; k < end; ++k) {
+                    if (covered[k]) differs = differs || current[k] != desired[k];
+                    else desired[k] = current[k];
+                }
+            }
+            if (!differs) {
+                ++unchanged;
+                continue;
+            }
         }
 
         if (!eraseBlock(index, args, type, block, fileMode)) {
@@ -182,7 +184,7 @@ bool Type1SPIDevice::programBlocks(int index, UT_CMDARGS* args) {
         }
         if (!cancelled && verifyAfter) {
             // A recording compares what it reads with what the block should hold.
-            if (!readFlash(block, current.data(), size, desired.data())) {
+            if (!flash.read(block, current.data(), size, desired.data())) {
                 DEVICE_MESSAGE().issueError("'%d': Verification terminated, the block at address 0x%X could not be read.\n",
                                             index, block);
                 spidisable(index, args);

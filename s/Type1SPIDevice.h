@@ -98,10 +98,6 @@ private:
     void reportPageFailure(int index, PageOutcome outcome, unsigned address);
     bool finishProgramming(int index, UT_CMDARGS* args, bool result);
     ConfigDataReader* dataToProgram(int index);
-    // Reads `count` bytes from `address` page by page into `bytes`, each
-    // page's capture preloaded with `expected` (may be null: zeros), which a
-    // recording compares.
-    bool readFlash(unsigned address, unsigned char* bytes, std::size_t count, const unsigned char* expected);
     // Write enable, the block erase with its address, the wait and, on a
     // cable, the polling; true when the erase is proven done (or, without
     // polling, waited out).
