@@ -180,13 +180,14 @@ void FlashFile::createErased() {
 }
 
 void FlashFile::load(std::vector<std::uint8_t>& memory, std::uint8_t& status1, std::uint8_t& status2) {
-    std::vector<std::uint8_t> contents(sizeBytes_);
+    // Read straight into the chip's array: a second copy would double the
+    // memory a large flash costs.
+    memory.resize(sizeBytes_);
     char trailer[kTrailerBytes];
     stream_.seekg(0);
-    stream_.read(reinterpret_cast<char*>(contents.data()), static_cast<std::streamsize>(contents.size()));
+    stream_.read(reinterpret_cast<char*>(memory.data()), static_cast<std::streamsize>(memory.size()));
     stream_.read(trailer, sizeof trailer);
     if (!stream_) fail("cannot be read");
-    memory = std::move(contents);
     status1 = static_cast<std::uint8_t>(trailer[8]) & 0xFC;
     status2 = static_cast<std::uint8_t>(trailer[9]);
 }

@@ -39,7 +39,9 @@ public:
 
     const std::string& path() const { return path_; }
 
-    // The contents as found on opening.
+    // The contents as found on opening, read into `memory` (resized to the
+    // flash); throws FlashFileError, with `memory` undefined, when they
+    // cannot be read.
     void load(std::vector<std::uint8_t>& memory, std::uint8_t& status1, std::uint8_t& status2);
 
     void writeMemory(std::size_t offset, const std::uint8_t* data, std::size_t length);
