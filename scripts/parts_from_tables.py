@@ -190,10 +190,44 @@ def ascii_text(text):
     return "".join(ch if ord(ch) < 128 else ASCII_FOR.get(ch, "?") for ch in text)
 
 
-def sector_erase_max_us(size):
-    # Maximum times of one erase of the smallest size: the vendor families'
-    # usual datasheet limits (estimates; the key is recorded, not used).
-    return {256: 20000, 4096: 400000, 65536: 3000000, 262144: 6000000}[size]
+def sector_erase_estimate_us(size):
+    # (typical, maximum) of one erase of the smallest size: the vendor
+    # families' usual datasheet figures, placeholders for parts whose own
+    # figures are not in the reference data. Polling ends the wait when the
+    # chip is done, so a typical guess costs a few polls, never a page.
+    return {256: (1000, 20000), 4096: (45000, 400000), 65536: (600000, 3000000),
+            262144: (520000, 6000000)}[size]
+
+
+def sfdp_erase_types(part):
+    """Erase types of a part's real SFDP dump: [(bytes, opcode, typical us,
+    maximum us)] in the table's order, times None where the table (before
+    revision 1.5) has none; [] without a dump."""
+    if part not in SFDP_DUMPS:
+        return []
+    table = bytes.fromhex(sfdp_value(part))
+    for header in range(table[6] + 1):
+        entry = table[8 + 8 * header:16 + 8 * header]
+        if entry[0] == 0x00 and entry[7] == 0xFF:  # the basic flash parameter table
+            length, start = entry[3], entry[4] | entry[5] << 8 | entry[6] << 16
+            break
+    else:
+        return []
+    dword = lambda k: int.from_bytes(table[start + 4 * k:start + 4 * k + 4], "little")
+    times = dword(9) if length >= 10 else None
+    types = []
+    for k, (word, shift) in enumerate([(7, 0), (7, 16), (8, 0), (8, 16)]):
+        field = dword(word) >> shift & 0xFFFF
+        if field & 0xFF == 0:
+            continue
+        typical = maximum = None
+        if times is not None:
+            low = (4, 11, 18, 25)[k]
+            count, unit = times >> low & 0x1F, times >> (low + 5) & 3
+            typical = (count + 1) * (1000, 16000, 128000, 1000000)[unit]
+            maximum = typical * 2 * ((times & 0xF) + 1)
+        types.append((1 << (field & 0xFF), "%02X" % (field >> 8), typical, maximum))
+    return types
 
 
 def part_keys(row):
@@ -226,14 +260,34 @@ def part_keys(row):
     add("WRITESR_INSTRUCTION", opcode_bits(row["wrsr"]))
     # Over 16 MiB: the opcodes that always take a 4-byte address, so no mode
     # switch is needed or left behind.
-    native = {"03": "13", "0B": "0C", "02": "12", "20": "21", "D8": "DC"}
+    native = {"03": "13", "0B": "0C", "02": "12", "20": "21", "52": "5C", "D8": "DC"}
     pick = lambda op: native[op] if four_byte else op
     add("READ_INSTRUCTION", opcode_bits(pick(row["read"])))
     add("FASTREAD_INSTRUCTION", opcode_bits(pick(row["fast_read"])))
     add("PAGEPROGRAM_INSTRUCTION", opcode_bits(pick(row["pp"])))
     add("SECTORERASE_INSTRUCTION", opcode_bits(pick(row["se"])))
-    add("SECTOR_SIZE", int(row["se_size_bytes"]))
-    add("SECTORERASE_WAITTIME", sector_erase_max_us(int(row["se_size_bytes"])))
+    sector = int(row["se_size_bytes"])
+    add("SECTOR_SIZE", sector)
+    # Each erase size the real SFDP table lists with its times; otherwise the
+    # smallest erase with family estimates.
+    from_sfdp = {size: (op, typ, mx) for size, op, typ, mx in sfdp_erase_types(row["part"]) if typ is not None}
+    typ, mx = from_sfdp[sector][1:] if sector in from_sfdp else sector_erase_estimate_us(sector)
+    add("SECTORERASE_WAITTIME", typ)
+    add("SECTORERASE_WAITTIME_INC", max(1, typ // 10))
+    add("SECTORERASE_MAXWAITTIME", mx * 3 // 2)
+    for size, prefix, simulated in ((32768, "BLOCKERASE32", "SIM_BLOCK32_ERASE_US"),
+                                    (65536, "BLOCKERASE64", "SIM_BLOCK64_ERASE_US")):
+        if size == sector or size not in from_sfdp:
+            continue
+        op, typ, mx = from_sfdp[size]
+        add(prefix + "_INSTRUCTION", opcode_bits(pick(op)))
+        add(prefix + "_SIZE", size)
+        add(prefix + "_WAITTIME", typ)
+        add(prefix + "_WAITTIME_INC", max(1, typ // 10))
+        add(prefix + "_MAXWAITTIME", mx * 3 // 2)
+        add(simulated, typ)
+    if sector in from_sfdp:
+        add("SIM_SECTOR_ERASE_US", from_sfdp[sector][1])
     add("BULKERASE_INSTRUCTION", opcode_bits(row["be"]))
     has_dp = row["dp"] != "-"
     has_res = row["res"] != "-"
@@ -332,8 +386,10 @@ def render(file_stem, rows, skipped, tables):
     out.append("# Wait rule (microseconds), as in the hand-written files: first wait = typical")
     out.append("# time, polling step = a tenth of it, limit = maximum x 1.5, erase progress")
     out.append("# step = (limit - first wait) / 100, status-write limit = tW max x 1.5,")
-    out.append("# release wait = tRES1 x 1.5 rounded up. SECTORERASE_WAITTIME is a family")
-    out.append("# estimate of the smallest erase's maximum (recorded, not used).")
+    out.append("# release wait = tRES1 x 1.5 rounded up. Erase sizes and times: a part with")
+    out.append("# a real SFDP table (SFDP key) takes its erase types and typical and maximum")
+    out.append("# times from it; the others keep their smallest erase with family estimates")
+    out.append("# (typical 45 ms and maximum 400 ms for 4 KiB) as placeholders.")
     if skipped:
         out.append("#")
         out.append("# Left out:")
