@@ -8,7 +8,7 @@ packages=(
   libgtest-dev libgmock-dev libbenchmark-dev
   libtomlplusplus-dev libcli11-dev
   g++-mingw-w64-x86-64 binutils-mingw-w64-x86-64
-  srecord openocd
+  srecord openocd flashrom
   libftdi1-dev libusb-1.0-0-dev
   clang-14 libclang-rt-14-dev
 )

@@ -12,4 +12,6 @@ nm -D --defined-only build/ci/bin/libVorantType1SPIDevice.so | grep -q ' T creat
 build/ci/bin/vorant-bench
 # Programming only what an image covers, against the physical bound of each job.
 build/ci/bin/vorant-block-bench
+# The tool from outside: CPU beside flashrom's emulated write, peak memory.
+build/ci/bin/vorant-tool-bench
 ctest --preset ci
