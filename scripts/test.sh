@@ -12,4 +12,6 @@ nm -D --defined-only build/ci/bin/libVorantType1SPIDevice.so | grep -q ' T creat
 build/ci/bin/vorant-bench
 # Programming only what an image covers, against the physical bound of each job.
 build/ci/bin/vorant-block-bench
+# The spidev cable's ioctls per page and per transaction, through its double (Linux builds).
+if [ -x build/ci/bin/vorant-spidev-bench ]; then build/ci/bin/vorant-spidev-bench; fi
 ctest --preset ci

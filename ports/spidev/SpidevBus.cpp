@@ -50,8 +50,10 @@ bool SpidevBus::transact(std::span<const spi::SpiSegment> segments) {
         SpidevTransfer transfer;
         // A read that sends zeros leaves tx empty: the kernel shifts zeros
         // for it, and the message says plainly which bytes are read.
-        const bool sendsZeros = segment.miso != nullptr &&
-                                std::all_of(segment.mosi, segment.mosi + segment.length, [](std::uint8_t b) { return b == 0; });
+        const bool sendsZeros =
+            segment.mosi == nullptr ||
+            (segment.miso != nullptr &&
+             std::all_of(segment.mosi, segment.mosi + segment.length, [](std::uint8_t b) { return b == 0; }));
         transfer.txBuffer = sendsZeros ? 0 : address(segment.mosi);
         transfer.rxBuffer = address(segment.miso);
         transfer.length = static_cast<std::uint32_t>(std::min<std::size_t>(segment.length, UINT32_MAX));

@@ -138,7 +138,7 @@ struct FailureCase {
 // says why, and only a device that is gone is lost.
 TEST_F(SpidevPortTest, AFailedTransactionSaysWhyAndOnlyAVanishedDeviceIsLost) {
     const FailureCase cases[] = {
-        {"larger than bufsiz: never sent", [](FakeSpidev& d) { d.bufsiz = 300; }, 301,
+        {"larger than bufsiz", [](FakeSpidev& d) { d.bufsiz = 300; }, 301,
          "a transaction of 301 bytes is larger than the spidev driver's buffer (spidev.bufsiz, 300 bytes); raise it "
          "with the kernel parameter spidev.bufsiz=4096",
          false},
