@@ -12,15 +12,18 @@ namespace {
 // 511 transfers fit on most architectures, 255 on all of them.
 constexpr std::size_t kMostTransfers = 255;
 
-std::uint64_t address(const void* buffer) { return static_cast<std::uint64_t>(reinterpret_cast<std::uintptr_t>(buffer)); }
+std::uint64_t address(const void* buffer) {
+    return static_cast<std::uint64_t>(reinterpret_cast<std::uintptr_t>(buffer));
+}
 
 // Errors after which the node answers nothing more: the device was
 // removed, or its controller or driver went away.
 bool meansGone(int error) { return error == ENODEV || error == ESHUTDOWN || error == ENXIO; }
 
 std::string tooLarge(std::uint64_t bytes, std::uint32_t bufferBytes) {
-    return "a transaction of " + std::to_string(bytes) + " bytes is larger than the spidev driver's buffer (spidev.bufsiz, " +
-           std::to_string(bufferBytes) + " bytes); " + raiseBufsizAdvice(bytes);
+    return "a transaction of " + std::to_string(bytes) +
+           " bytes is larger than the spidev driver's buffer (spidev.bufsiz, " + std::to_string(bufferBytes) +
+           " bytes); " + raiseBufsizAdvice(bytes);
 }
 
 }  // namespace
@@ -78,7 +81,8 @@ bool SpidevBus::transact(std::span<const spi::SpiSegment> segments) {
         if (error == EMSGSIZE) return fail(tooLarge(total, bufferBytes_));
         lost_ = meansGone(error);
         return fail(std::string("SPI_IOC_MESSAGE failed: ") + std::strerror(error) +
-                    (lost_ ? "; the SPI device is gone (controller removed or spidev unbound): check the board and run again"
+                    (lost_ ? "; the SPI device is gone (controller removed or spidev unbound): check the board and "
+                             "run again"
                            : ""));
     }
     // SPI has no acknowledge; the byte count is the one thing the driver

@@ -39,7 +39,8 @@ std::uint32_t speedOf(const PortAddress& address) {
         scale = unit == 'M' ? 1'000'000 : 1'000;
         digits.pop_back();
     }
-    const bool number = !digits.empty() && digits.size() <= 10 && digits.find_first_not_of("0123456789") == std::string::npos;
+    const bool number =
+        !digits.empty() && digits.size() <= 10 && digits.find_first_not_of("0123456789") == std::string::npos;
     const std::uint64_t hz = number ? std::stoull(digits) * scale : 0;
     if (!number || hz < kSlowestHz || hz > kFastestHz)
         throw PortError(PortError::Kind::BadRequest,
@@ -103,8 +104,9 @@ std::vector<FoundCable> findSpidevNodes(const std::filesystem::path& folder) {
                          {"spidev:" + entry.path().string(),
                           "SPI bus " + std::to_string(bus) + ", chip select " + std::to_string(chipSelect)}});
     }
-    std::sort(nodes.begin(), nodes.end(),
-              [](const Node& a, const Node& b) { return std::tie(a.bus, a.chipSelect) < std::tie(b.bus, b.chipSelect); });
+    std::sort(nodes.begin(), nodes.end(), [](const Node& a, const Node& b) {
+        return std::tie(a.bus, a.chipSelect) < std::tie(b.bus, b.chipSelect);
+    });
     std::vector<FoundCable> found;
     for (Node& node : nodes) found.push_back(std::move(node.cable));
     return found;

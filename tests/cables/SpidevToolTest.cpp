@@ -60,8 +60,8 @@ struct Answer {
 
 TEST_F(SpidevTool, AnswersFromTheChip) {
     const Answer answers[] = {
-        {"idcode", {"--part", "auto", "idcode"}, "EF4018", nullptr},
-        {"status", {"--part", "auto", "status"}, "tatus", nullptr},
+        {"idcode", {"--part", "auto", "idcode"}, "IDCODE is 'EF4018'", nullptr},
+        {"status", {"--part", "auto", "status"}, "W25Q128JV Status Register Contents = 0x0000", nullptr},
         {"qe set", {"--part", "W25Q128JV", "qe", "set"}, "",
          [](const sim::FlashModel& f) { return (f.status2() & 0x02) != 0; }},
     };

@@ -183,7 +183,8 @@ TEST(SpidevDiscovery, ListsTheNodesByBusAndChipSelect) {
     for (const char* name : {"spidev1.0", "spidev0.1", "spidev10.2", "spidev0.0", "spidev", "spidevX.0", "ttyS0"})
         std::ofstream(dir / name).put('\0');
     std::vector<std::string> found;
-    for (const FoundCable& cable : spidev::findSpidevNodes(dir)) found.push_back(cable.address + " " + cable.description);
+    for (const FoundCable& cable : spidev::findSpidevNodes(dir))
+        found.push_back(cable.address + " " + cable.description);
     const std::string at = "spidev:" + dir.string() + "/";
     EXPECT_EQ(found, std::vector<std::string>({at + "spidev0.0 SPI bus 0, chip select 0",
                                                at + "spidev0.1 SPI bus 0, chip select 1",
