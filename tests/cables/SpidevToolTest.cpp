@@ -92,6 +92,16 @@ TEST_F(SpidevTool, ProgramsVerifiesAndReadsBack) {
     EXPECT_EQ(node.opened.size(), 2u);
 }
 
+// A chip older than SFDP answers 5Ah with ones; --part auto must still
+// tell it from its younger twin, in transactions spidev's buffer takes.
+TEST_F(SpidevTool, IdentifiesAChipOlderThanSfdp) {
+    sim::FlashModel oldChip(sim::FlashConfig::fromPartDatabase("MX25L3206E"));
+    FakeSpidevNode oldNode(&oldChip);
+    const ToolRun result = run({"--part", "auto", "idcode"});
+    EXPECT_EQ(result.status, 0) << result.text();
+    EXPECT_NE(result.out.find("IDCODE is 'C22016'"), std::string::npos) << result.text();
+}
+
 struct Failure {
     const char* name;
     std::function<void(FakeSpidevNode&)> shape;
