@@ -175,6 +175,24 @@ TEST_F(SpidevPortTest, AFailedTransactionSaysWhyAndOnlyAVanishedDeviceIsLost) {
     }
 }
 
+// The real seam, where no SPI hardware is needed to reach it: a node that
+// is not there, and one of another driver.
+TEST(SpidevOnLinux, RefusesAnAbsentNodeAndANodeOfAnotherDriver) {
+    const std::pair<const char*, const char*> cases[] = {
+        {"spidev:/dev/vorant-no-such-spidev", "cannot open /dev/vorant-no-such-spidev: No such file or directory"},
+        {"spidev:/dev/null", "/dev/null is not a spidev device (SPI_IOC_WR_MODE: Inappropriate ioctl for device)"},
+    };
+    for (const auto& [address, refusal] : cases) {
+        try {
+            findPort("spidev")->open(parsePortAddress(address), PortContext{});
+            ADD_FAILURE() << address << " opened";
+        } catch (const PortError& error) {
+            EXPECT_EQ(error.kind(), PortError::Kind::Unavailable);
+            EXPECT_NE(std::string(error.what()).find(refusal), std::string::npos) << error.what();
+        }
+    }
+}
+
 TEST(SpidevDiscovery, ListsTheNodesByBusAndChipSelect) {
     namespace fs = std::filesystem;
     const fs::path dir = fs::temp_directory_path() / ("vorant-spidev-dev-" + std::to_string(getpid()));
