@@ -7,6 +7,10 @@
 // knows opcodes only as the first byte of a message.
 //
 //   vorant-spidev-bench [KIB]      (default 1024)
+//
+// On the 2-core development machine: 3.00 ioctls per page programmed (write
+// enable, page program, one status poll), 1.000 ioctl per transaction, 6
+// setup ioctls per run; 0.1 s of CPU for the whole run.
 #include "bench/ResourceUsage.h"
 #include "cli/PartDatabaseSetup.h"
 #include "cli/Tool.h"
