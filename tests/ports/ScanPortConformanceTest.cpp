@@ -167,7 +167,9 @@ private:
 struct SpidevInstance {
     static constexpr const char* kAddress = "spidev:/dev/spidev0.0";
     static constexpr bool kReadsBack = true;
-    static std::unique_ptr<Port> open(const PortContext& context) { return std::make_unique<SpidevOverDouble>(context); }
+    static std::unique_ptr<Port> open(const PortContext& context) {
+        return std::make_unique<SpidevOverDouble>(context);
+    }
 };
 #define VORANT_SPIDEV_INSTANCE , SpidevInstance
 #else
