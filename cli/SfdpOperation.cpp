@@ -21,8 +21,14 @@ constexpr std::size_t kLargestArea = 4096;
 
 std::optional<std::vector<std::uint8_t>> readSfdpArea(ScanPort& port) {
     ChipProbe probe(port);
-    auto header = probe.read(kReadSfdpFromStart, 8);
+    // The header and the first parameter header: the least a table holds.
+    auto header = probe.read(kReadSfdpFromStart, 16);
     if (!header) return std::nullopt;
+    // A chip without SFDP answers something else (all ones, mostly): these
+    // bytes are then the whole answer, and the decoder says what is wrong.
+    // Reading on would fetch the largest area of junk, more than a cable
+    // such as spidev (4 KiB buffer) moves in one transaction.
+    if (!std::equal(header->begin(), header->begin() + 4, "SFDP")) return header;
     const std::size_t headerBytes = 8 + 8 * (static_cast<std::size_t>((*header)[6]) + 1);
     auto headers = probe.read(kReadSfdpFromStart, headerBytes);
     if (!headers) return std::nullopt;

@@ -7,6 +7,9 @@
 #include "ports/openocd/OpenOcdPort.h"
 #endif
 #include "ports/svf/SvfPort.h"
+#if VORANT_HAVE_SPIDEV
+#include "ports/spidev/SpidevPort.h"
+#endif
 
 #include <sstream>
 
@@ -48,6 +51,9 @@ const std::vector<PortInfo>& portTable() {
 #if VORANT_HAVE_OPENOCD
         openocd::openOcdPortInfo(),
 #endif
+#if VORANT_HAVE_SPIDEV
+        spidev::spidevPortInfo(),
+#endif
     };
     return table;
 }
@@ -58,6 +64,9 @@ const std::vector<std::string>& portsLeftOut() {
     static const std::vector<std::string> names = {
 #if !VORANT_HAVE_OPENOCD
         "openocd (needs POSIX sockets)",
+#endif
+#if !VORANT_HAVE_SPIDEV
+        "spidev (Linux only)",
 #endif
     };
     return names;

@@ -14,4 +14,6 @@ build/ci/bin/vorant-bench
 build/ci/bin/vorant-block-bench
 # The tool from outside: CPU beside flashrom's emulated write, peak memory.
 build/ci/bin/vorant-tool-bench
+# The spidev cable's ioctls per page and per transaction, through its double (Linux builds).
+if [ -x build/ci/bin/vorant-spidev-bench ]; then build/ci/bin/vorant-spidev-bench; fi
 ctest --preset ci
