@@ -98,8 +98,16 @@ std::string longestLimitsAmongTimingTwins(const std::vector<std::string>& parts)
             if (database.hasProperty(part, key)) total += database.getDeviceLongProperty(part.c_str(), key);
         return total;
     };
+    // On equal limits, the entry that names more of the chip's erase sizes
+    // (their shared SFDP table says the chip has them all) programs faster.
+    auto eraseSizes = [&](const std::string& part) {
+        int count = 0;
+        for (const char* key : {"SECTORERASE_INSTRUCTION", "BLOCKERASE32_INSTRUCTION", "BLOCKERASE64_INSTRUCTION"})
+            count += database.hasProperty(part, key) ? 1 : 0;
+        return count;
+    };
     return *std::max_element(parts.begin(), parts.end(), [&](const std::string& a, const std::string& b) {
-        return limits(a) < limits(b);
+        return std::make_pair(limits(a), eraseSizes(a)) < std::make_pair(limits(b), eraseSizes(b));
     });
 }
 

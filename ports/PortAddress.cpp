@@ -28,11 +28,6 @@ std::string form(const PortInfo& row) {
 
 }  // namespace
 
-std::string PortAddress::key(const std::string& name, const std::string& fallback) const {
-    const auto found = keys.find(name);
-    return found == keys.end() ? fallback : found->second;
-}
-
 PortAddress parsePortAddress(const std::string& text) {
     PortAddress address;
     address.text = text;

@@ -20,8 +20,12 @@ struct PortAddress {
     bool hasPath = false;
     std::map<std::string, std::string> keys{};
 
-    // The key's value, or `fallback` when it was not given.
-    std::string key(const std::string& name, const std::string& fallback = {}) const;
+    // The key's value, or `fallback` when it was not given. Inline: every
+    // port library reads its keys, below the table that lists the ports.
+    std::string key(const std::string& name, const std::string& fallback = {}) const {
+        const auto found = keys.find(name);
+        return found == keys.end() ? fallback : found->second;
+    }
 };
 
 // Splits the text and checks it against the row of its kind: a known kind,
