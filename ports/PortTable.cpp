@@ -6,6 +6,9 @@
 #if VORANT_HAVE_OPENOCD
 #include "ports/openocd/OpenOcdPort.h"
 #endif
+#if VORANT_HAVE_FTDI
+#include "ports/ftdi/FtdiPort.h"
+#endif
 #include "ports/svf/SvfPort.h"
 
 #include <sstream>
@@ -48,6 +51,9 @@ const std::vector<PortInfo>& portTable() {
 #if VORANT_HAVE_OPENOCD
         openocd::openOcdPortInfo(),
 #endif
+#if VORANT_HAVE_FTDI
+        ftdi::ftdiPortInfo(),
+#endif
     };
     return table;
 }
@@ -58,6 +64,9 @@ const std::vector<std::string>& portsLeftOut() {
     static const std::vector<std::string> names = {
 #if !VORANT_HAVE_OPENOCD
         "openocd (needs POSIX sockets)",
+#endif
+#if !VORANT_HAVE_FTDI
+        "ftdi (needs libftdi1)",
 #endif
     };
     return names;

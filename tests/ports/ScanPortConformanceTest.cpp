@@ -11,6 +11,9 @@
 #include "ports/openocd/OpenOcdPort.h"
 #include "ports/sim/FlashModel.h"
 #include "tests/doubles/FakeTclRpc.h"
+#if VORANT_HAVE_FTDI
+#include "tests/doubles/FakeMpsse.h"
+#endif
 #include "tests/support/TestParts.h"
 
 #include <gtest/gtest.h>
@@ -136,9 +139,40 @@ struct OpenOcdInstance {
     }
 };
 
+#if VORANT_HAVE_FTDI
+// The FTDI cable through its row, with the MPSSE double behind the seam;
+// the engine starts as another program left it.
+class FtdiOverDouble final : public Port {
+public:
+    explicit FtdiOverDouble(const PortContext& context)
+        : flash_(sim::FlashConfig::fromPartDatabase(context.chipName)), mpsse_(flash_), usb_(&mpsse_) {
+        mpsse_.faults.leftoverState = true;
+        usb_.devices = {vorant::test::FakeFtdiUsb::ft232h()};
+        port_ = findPort("ftdi")->open(parsePortAddress("ftdi"), context);
+    }
+    ~FtdiOverDouble() override { EXPECT_EQ(mpsse_.misuse, std::vector<std::string>{}); }
+    ScanPort& scan() override { return port_->scan(); }
+
+private:
+    sim::FlashModel flash_;
+    vorant::test::FakeMpsse mpsse_;
+    vorant::test::FakeFtdiUsb usb_;
+    std::unique_ptr<Port> port_;
+};
+struct FtdiInstance {
+    static constexpr const char* kAddress = "ftdi";
+    static constexpr bool kReadsBack = true;
+    static std::unique_ptr<Port> open(const PortContext& context) { return std::make_unique<FtdiOverDouble>(context); }
+};
+#endif
+
 using Instances =
     ::testing::Types<SimInstance, SvfInstance, BoardJtagSpiInstance, BoardInAChainInstance, BoardShiftDrInstance,
-                     OpenOcdInstance>;
+                     OpenOcdInstance
+#if VORANT_HAVE_FTDI
+                     , FtdiInstance
+#endif
+                     >;
 TYPED_TEST_SUITE(ScanPortConformance, Instances);
 
 TYPED_TEST(ScanPortConformance, StartsHealthyAndSaysWhatItIs) {
