@@ -146,8 +146,9 @@ std::unique_ptr<FtdiIo> openChannel(const PortAddress& address, const FtdiReques
         case FtdiUsbFailure::Permission:
             unavailable(address, what + ": " + opening.detail + "; " + udevAdvice(device.id));
         case FtdiUsbFailure::Busy:
-            unavailable(address, what + ": it is in use (" + opening.detail +
-                                     "): another program has claimed it, or the kernel's ftdi_sio driver holds it and "
+            unavailable(address, what + ": it is in use" +
+                                     (opening.detail.empty() ? "" : " (" + opening.detail + ")") +
+                                     ": another program has claimed it, or the kernel's ftdi_sio driver holds it and "
                                      "could not be detached; close the other program, or unbind ftdi_sio "
                                      "(sudo rmmod ftdi_sio)");
         case FtdiUsbFailure::NotFound:
