@@ -12,4 +12,6 @@ nm -D --defined-only build/ci/bin/libVorantType1SPIDevice.so | grep -q ' T creat
 build/ci/bin/vorant-bench
 # Programming only what an image covers, against the physical bound of each job.
 build/ci/bin/vorant-block-bench
+# Bytes and USB round trips per page on the FTDI cable (where libftdi1 is there).
+if [ -x build/ci/bin/vorant-ftdi-bench ]; then build/ci/bin/vorant-ftdi-bench; fi
 ctest --preset ci

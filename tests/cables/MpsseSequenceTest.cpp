@@ -134,5 +134,49 @@ TEST_F(MpsseSequence, SpeedRoundsDownToAStepOfTheDivider) {
     }
 }
 
+// The double itself, on the reference's examples and on the mistakes a
+// port could make: a reply where the reference gives one, a refusal where
+// the chip would clock garbage.
+TEST_F(MpsseSequence, TheDoubleAnswersLikeTheReferenceAndCatchesAMisdrivenBus) {
+    struct Row {
+        const char* name;
+        Bytes write;
+        Bytes reply;          // when the write is accepted
+        std::string refusal;  // when it is not
+    };
+    const Row rows[] = {
+        {"ID, MSB first", {0x80, 0x00, 0x0B, 0x11, 0x00, 0x00, 0x9F, 0x20, 0x02, 0x00, 0x80, 0x08, 0x0B, 0x87},
+         {0xEF, 0x40, 0x18}, ""},
+        {"ID, LSB first", {0x80, 0x00, 0x0B, 0x19, 0x00, 0x00, 0xF9, 0x28, 0x02, 0x00, 0x80, 0x08, 0x0B, 0x87},
+         {0xF7, 0x02, 0x18}, ""},
+        {"ID, 4 bits then 4", {0x80, 0x00, 0x0B, 0x11, 0x00, 0x00, 0x9F, 0x22, 0x03, 0x22, 0x03, 0x80, 0x08, 0x0B, 0x87},
+         {0x0E, 0x0F}, ""},
+        {"unknown opcode", {0xAB, 0x87}, {0xFA, 0xAB}, ""},
+        {"chip select high", {0x80, 0x08, 0x0B, 0x11, 0x00, 0x00, 0x06}, {}, "with chip select (ADBUS3) high"},
+        {"SCK an input", {0x80, 0x00, 0x0A, 0x11, 0x00, 0x00, 0x06}, {}, "SCK (ADBUS0) not an output"},
+        {"MOSI an input", {0x80, 0x00, 0x09, 0x11, 0x00, 0x00, 0x06}, {}, "MOSI (ADBUS1) not an output"},
+        {"out on the rising edge", {0x80, 0x00, 0x0B, 0x10, 0x00, 0x00, 0x06}, {}, "on the rising edge"},
+        {"3-phase clocking", {0x8C, 0x80, 0x00, 0x0B, 0x11, 0x00, 0x00, 0x06}, {}, "3-phase"},
+        {"length cut short", {0x80, 0x00, 0x0B, 0x11, 0x00}, {}, "malformed MPSSE command 11: its length"},
+        {"data cut short", {0x80, 0x00, 0x0B, 0x11, 0x01, 0x00, 0x06}, {}, "carries 2 data bytes"},
+    };
+    for (const Row& row : rows) {
+        FakeMpsse device(flash);
+        ASSERT_TRUE(device.setBitmode(0x00, 0x02));
+        ASSERT_TRUE(device.write(Bytes{0x8A, 0x97}));
+        const bool accepted = device.write(row.write);
+        EXPECT_EQ(accepted, row.refusal.empty()) << row.name << ": " << device.error();
+        if (!accepted) {
+            EXPECT_NE(device.error().find(row.refusal), std::string::npos) << row.name << ": " << device.error();
+            continue;
+        }
+        Bytes reply(row.reply.size() + 1);
+        std::size_t got = 0;
+        ASSERT_TRUE(device.read(reply, got, std::chrono::milliseconds(0)));
+        reply.resize(got);
+        EXPECT_EQ(reply, row.reply) << row.name;
+    }
+}
+
 }  // namespace
 }  // namespace vorant::cables::test
