@@ -171,10 +171,10 @@ std::unique_ptr<Port> open(const PortAddress& address, const PortContext&) {
                              ": SCK " + hertz(sck) + ", chip select on ADBUS" + std::to_string(request.chipSelectPin);
     if (sck != request.speedHz)
         Port_MsgManData::createObject("vorant-spi", "ports/ftdi", __LINE__, VORANT_REVISION)
-            .issueInfo("%s (speed=%s is not a step of the clock divider; the next one below it)", said.c_str(),
-                       hertz(request.speedHz).c_str());
+            .issueInfo("%s (speed=%s is not one of the steps 30 MHz / N; this is the next one below it)\n",
+                       said.c_str(), hertz(request.speedHz).c_str());
     else
-        Port_MsgManData::debugStub("%s", said.c_str());
+        Port_MsgManData::debugStub("%s\n", said.c_str());
     return std::make_unique<spi::SpiCable>("FTDI " + describe(device), std::move(bus));
 }
 

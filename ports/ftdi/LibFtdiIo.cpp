@@ -80,6 +80,10 @@ private:
     bool check(int result, const char* what) {
         if (result >= 0) return true;
         error_ = std::string(what) + ": " + ftdi_get_error_string(context_);
+        if (context_->usb_dev == nullptr) {  // libftdi closed it
+            lost_ = true;
+            return false;
+        }
         unsigned char status[2];
         const int probe = libusb_control_transfer(context_->usb_dev, kVendorRequestIn,
                                                   SIO_POLL_MODEM_STATUS_REQUEST, 0,
