@@ -12,6 +12,7 @@
 #include "ports/sim/FlashModel.h"
 #include "tests/doubles/FakeMpsse.h"
 
+#include <unistd.h>
 #include <algorithm>
 #include <cstdio>
 #include <ctime>
@@ -19,7 +20,6 @@
 #include <fstream>
 #include <random>
 #include <string>
-#include <unistd.h>
 #include <vector>
 
 namespace {
@@ -63,8 +63,8 @@ int main(int argc, char** argv) {
     vorant::test::FakeFtdiUsb usb(&mpsse);
     usb.devices = {vorant::test::FakeFtdiUsb::ft232h()};
 
-    std::string args[] = {"vorant-spi", "--quiet",    "--port", "ftdi,speed=30M", "--part", "W25Q128JV",
-                          "program",    "image.bin", "-e",     "-v"};
+    std::string args[] = {"vorant-spi", "--quiet", "--port", "ftdi,speed=30M", "--part", "W25Q128JV", "program",
+                          "image.bin",  "-e",      "-v"};
     std::vector<char*> argv2;
     for (std::string& arg : args) argv2.push_back(arg.data());
     const fs::path before = fs::current_path();

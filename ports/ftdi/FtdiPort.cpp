@@ -62,9 +62,12 @@ std::string udevAdvice(const FtdiUsbId& id) {
 
 std::string hertz(double hz) {
     char text[32];
-    if (hz >= 1e6) std::snprintf(text, sizeof text, "%.6g MHz", hz / 1e6);
-    else if (hz >= 1e3) std::snprintf(text, sizeof text, "%.6g kHz", hz / 1e3);
-    else std::snprintf(text, sizeof text, "%.6g Hz", hz);
+    if (hz >= 1e6)
+        std::snprintf(text, sizeof text, "%.6g MHz", hz / 1e6);
+    else if (hz >= 1e3)
+        std::snprintf(text, sizeof text, "%.6g kHz", hz / 1e3);
+    else
+        std::snprintf(text, sizeof text, "%.6g Hz", hz);
     return text;
 }
 
@@ -109,8 +112,7 @@ FtdiDeviceInfo chooseDevice(const PortAddress& address, const FtdiRequest& reque
             unavailable(address, "no FTDI device found (looked for " + lookedFor(ids) +
                                      "); plug the cable in, or give its VID:PID as ftdi:VID:PID");
         std::string found;
-        for (const FtdiDeviceInfo& device : listing.devices)
-            found += (found.empty() ? "" : ", ") + describe(device);
+        for (const FtdiDeviceInfo& device : listing.devices) found += (found.empty() ? "" : ", ") + describe(device);
         if (unreadable)
             unavailable(address, "no FTDI device with serial " + request.serial + " among " + found +
                                      ", and the serial of some cannot be read (no permission); " +
@@ -146,14 +148,14 @@ std::unique_ptr<FtdiIo> openChannel(const PortAddress& address, const FtdiReques
         case FtdiUsbFailure::Permission:
             unavailable(address, what + ": " + opening.detail + "; " + udevAdvice(device.id));
         case FtdiUsbFailure::Busy:
-            unavailable(address, what + ": it is in use" +
-                                     (opening.detail.empty() ? "" : " (" + opening.detail + ")") +
+            unavailable(address, what + ": it is in use" + (opening.detail.empty() ? "" : " (" + opening.detail + ")") +
                                      ": another program has claimed it, or the kernel's ftdi_sio driver holds it and "
                                      "could not be detached; close the other program, or unbind ftdi_sio "
                                      "(sudo rmmod ftdi_sio)");
         case FtdiUsbFailure::NotFound:
             unavailable(address, what + ": " + opening.detail + "; plug it in again");
-        default: unavailable(address, what + ": " + opening.detail + "; replug the cable and try again");
+        default:
+            unavailable(address, what + ": " + opening.detail + "; replug the cable and try again");
     }
 }
 
@@ -164,11 +166,11 @@ std::unique_ptr<Port> open(const PortAddress& address, const PortContext&) {
     auto bus = std::make_unique<MpsseBus>(openChannel(address, request, device),
                                           MpsseSettings{request.divisor, request.chipSelectPin});
     if (!bus->start())
-        unavailable(address, "the " + describe(device) + ", interface " + std::string(1, request.channel) + ": " +
-                                 bus->error());
+        unavailable(address,
+                    "the " + describe(device) + ", interface " + std::string(1, request.channel) + ": " + bus->error());
     const double sck = mpsseClockHz(request.divisor);
-    const std::string said = "FTDI " + describe(device) + ", interface " + std::string(1, request.channel) +
-                             ": SCK " + hertz(sck) + ", chip select on ADBUS" + std::to_string(request.chipSelectPin);
+    const std::string said = "FTDI " + describe(device) + ", interface " + std::string(1, request.channel) + ": SCK " +
+                             hertz(sck) + ", chip select on ADBUS" + std::to_string(request.chipSelectPin);
     if (sck != request.speedHz)
         Port_MsgManData::createObject("vorant-spi", "ports/ftdi", __LINE__, VORANT_REVISION)
             .issueInfo("%s (speed=%s is not one of the steps 30 MHz / N; this is the next one below it)\n",
@@ -217,8 +219,8 @@ const PortInfo& ftdiPortInfo() {
             {"speed", "HZ", "the SPI clock, 458 to 30000000 Hz (default 6000000; rounded down to a step of 30 MHz/N)"},
             {"cs", "PIN", "the chip select pin, ADBUS3 to ADBUS7 (default ADBUS3)"},
         };
-        info.caps = {.readsBack = true, .records = false, .simulatesChip = false, .hasBusClock = false,
-                     .takesSimFaults = false};
+        info.caps = {
+            .readsBack = true, .records = false, .simulatesChip = false, .hasBusClock = false, .takesSimFaults = false};
         info.open = &open;
         info.discover = &discover;
         return info;

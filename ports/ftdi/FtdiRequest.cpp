@@ -26,8 +26,9 @@ FtdiUsbId usbId(const PortAddress& address) {
     const std::string vendor = text.substr(0, colon);
     const std::string product = colon == std::string::npos ? std::string() : text.substr(colon + 1);
     if (!hexDigits(vendor) || !hexDigits(product))
-        refuse(address, "'" + text + "' is not VID:PID; give the USB vendor and product ids in hexadecimal, such as "
-                        "0403:6014");
+        refuse(address, "'" + text +
+                            "' is not VID:PID; give the USB vendor and product ids in hexadecimal, such as "
+                            "0403:6014");
     return {static_cast<std::uint16_t>(std::stoul(vendor, nullptr, 16)),
             static_cast<std::uint16_t>(std::stoul(product, nullptr, 16))};
 }
@@ -67,8 +68,10 @@ unsigned chipSelectPin(const PortAddress& address) {
     std::string upper;
     for (const char c : text) upper += static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
     std::string number = upper;
-    if (number.rfind("ADBUS", 0) == 0) number = number.substr(5);
-    else if (number.rfind("D", 0) == 0) number = number.substr(1);
+    if (number.rfind("ADBUS", 0) == 0)
+        number = number.substr(5);
+    else if (number.rfind("D", 0) == 0)
+        number = number.substr(1);
     if (number.size() != 1 || !std::isdigit(static_cast<unsigned char>(number[0])) || number[0] > '7')
         refuse(address, "cs=" + text + " is not an ADBUS pin; give ADBUS3 to ADBUS7");
     const unsigned pin = static_cast<unsigned>(number[0] - '0');

@@ -19,7 +19,7 @@ constexpr std::uint32_t kMinSpeedHz = 458;
 struct FtdiRequest {
     std::optional<FtdiUsbId> id;  // none: any of the three MPSSE chips
     char channel = 'A';
-    std::string serial;          // empty: any
+    std::string serial;                       // empty: any
     std::uint32_t speedHz = kDefaultSpeedHz;  // as asked
     std::uint16_t divisor = 0;                // the fastest SCK not above it
     unsigned chipSelectPin = 3;               // ADBUS3..ADBUS7

@@ -26,10 +26,14 @@ constexpr std::uint8_t kVendorRequestIn =
 
 FtdiChip chipOf(std::uint16_t bcdDevice) {
     switch (bcdDevice) {
-        case 0x0700: return FtdiChip::FT2232H;
-        case 0x0800: return FtdiChip::FT4232H;
-        case 0x0900: return FtdiChip::FT232H;
-        default: return FtdiChip::Other;
+        case 0x0700:
+            return FtdiChip::FT2232H;
+        case 0x0800:
+            return FtdiChip::FT4232H;
+        case 0x0900:
+            return FtdiChip::FT232H;
+        default:
+            return FtdiChip::Other;
     }
 }
 
@@ -85,8 +89,7 @@ private:
             return false;
         }
         unsigned char status[2];
-        const int probe = libusb_control_transfer(context_->usb_dev, kVendorRequestIn,
-                                                  SIO_POLL_MODEM_STATUS_REQUEST, 0,
+        const int probe = libusb_control_transfer(context_->usb_dev, kVendorRequestIn, SIO_POLL_MODEM_STATUS_REQUEST, 0,
                                                   static_cast<std::uint16_t>(context_->index), status, 2, 100);
         if (probe == LIBUSB_ERROR_NO_DEVICE) {
             lost_ = true;
@@ -132,27 +135,28 @@ FtdiListing listDevices(std::span<const FtdiUsbId> ids) {
         listing.detail = std::string("libusb cannot start: ") + libusb_strerror(static_cast<libusb_error>(rc));
         return listing;
     }
-    const bool listed = forEachUsbDevice(usb, listing.detail, [&](libusb_device* device, const libusb_device_descriptor& d) {
-        const FtdiUsbId id{d.idVendor, d.idProduct};
-        bool wanted = false;
-        for (const FtdiUsbId& candidate : ids) wanted = wanted || candidate == id;
-        if (!wanted) return;
-        FtdiDeviceInfo info;
-        info.id = id;
-        info.location = {libusb_get_bus_number(device), libusb_get_device_address(device)};
-        info.chip = chipOf(d.bcdDevice);
-        libusb_device_handle* handle = nullptr;
-        const int rc = libusb_open(device, &handle);
-        if (rc == 0) {
-            info.description = stringDescriptor(handle, d.iProduct);
-            info.serial = stringDescriptor(handle, d.iSerialNumber);
-            libusb_close(handle);
-        } else {
-            info.stringsProblem = rc == LIBUSB_ERROR_ACCESS ? "no permission to open it"
-                                                            : libusb_strerror(static_cast<libusb_error>(rc));
-        }
-        listing.devices.push_back(std::move(info));
-    });
+    const bool listed =
+        forEachUsbDevice(usb, listing.detail, [&](libusb_device* device, const libusb_device_descriptor& d) {
+            const FtdiUsbId id{d.idVendor, d.idProduct};
+            bool wanted = false;
+            for (const FtdiUsbId& candidate : ids) wanted = wanted || candidate == id;
+            if (!wanted) return;
+            FtdiDeviceInfo info;
+            info.id = id;
+            info.location = {libusb_get_bus_number(device), libusb_get_device_address(device)};
+            info.chip = chipOf(d.bcdDevice);
+            libusb_device_handle* handle = nullptr;
+            const int rc = libusb_open(device, &handle);
+            if (rc == 0) {
+                info.description = stringDescriptor(handle, d.iProduct);
+                info.serial = stringDescriptor(handle, d.iSerialNumber);
+                libusb_close(handle);
+            } else {
+                info.stringsProblem = rc == LIBUSB_ERROR_ACCESS ? "no permission to open it"
+                                                                : libusb_strerror(static_cast<libusb_error>(rc));
+            }
+            listing.devices.push_back(std::move(info));
+        });
     if (!listed) listing.failure = FtdiUsbFailure::Other;
     libusb_exit(usb);
     return listing;

@@ -12,10 +12,10 @@ constexpr std::uint8_t kModeReset = 0x00;
 constexpr std::uint8_t kModeMpsse = 0x02;
 
 // MPSSE opcodes.
-constexpr std::uint8_t kSetLowPins = 0x80;         // levels, directions of ADBUS7..0
-constexpr std::uint8_t kSetDivisor = 0x86;         // LL HH
+constexpr std::uint8_t kSetLowPins = 0x80;  // levels, directions of ADBUS7..0
+constexpr std::uint8_t kSetDivisor = 0x86;  // LL HH
 constexpr std::uint8_t kSendImmediate = 0x87;
-constexpr std::uint8_t kDivideBy5Off = 0x8A;       // 60 MHz engine clock
+constexpr std::uint8_t kDivideBy5Off = 0x8A;  // 60 MHz engine clock
 constexpr std::uint8_t kThreePhaseOff = 0x8D;
 constexpr std::uint8_t kAdaptiveClockOff = 0x97;
 constexpr std::uint8_t kLoopbackOff = 0x85;
@@ -115,9 +115,10 @@ bool MpsseBus::start() {
     std::size_t got = 0;
     if (!io_->read(answer, got, kReplySlack)) return ioFailure("reading the MPSSE synchronisation");
     if (got != 2 || answer[0] != kBadCommandEcho || answer[1] != kCheckOpcode)
-        return fail("the device did not answer as an MPSSE engine: opcode AA should come back as FA AA, but " +
-                    (got == 0 ? std::string("nothing came back within 1000 ms") : "it answered " + hexBytes(answer, got)) +
-                    "; is this an FT232H, FT2232H or FT4232H, on interface A or B?");
+        return fail(
+            "the device did not answer as an MPSSE engine: opcode AA should come back as FA AA, but " +
+            (got == 0 ? std::string("nothing came back within 1000 ms") : "it answered " + hexBytes(answer, got)) +
+            "; is this an FT232H, FT2232H or FT4232H, on interface A or B?");
     const std::uint16_t divisor = settings_.divisor;
     held_ = {kDivideBy5Off,
              kSetDivisor,
@@ -183,7 +184,8 @@ bool MpsseBus::roundTrip() {
     held_.push_back(kSendImmediate);
     const std::size_t expected = replyBytes_ + 2;
     const auto timeout =
-        kReplySlack + std::chrono::milliseconds(static_cast<std::uint64_t>(2000.0 * heldBits_ / mpsseClockHz(settings_.divisor)));
+        kReplySlack +
+        std::chrono::milliseconds(static_cast<std::uint64_t>(2000.0 * heldBits_ / mpsseClockHz(settings_.divisor)));
     if (!send()) return false;
     reply_.assign(expected, 0);
     std::size_t got = 0;
@@ -192,7 +194,8 @@ bool MpsseBus::roundTrip() {
     replyBytes_ = 0;
     if (got != expected)
         return fail("a short or late reply from the FTDI device: " + std::to_string(got) + " of the " +
-                    std::to_string(expected) + " bytes expected came within " + std::to_string(timeout.count()) + " ms");
+                    std::to_string(expected) + " bytes expected came within " + std::to_string(timeout.count()) +
+                    " ms");
     if (reply_[expected - 2] != kBadCommandEcho || reply_[expected - 1] != kCheckOpcode)
         return fail("a malformed reply from the FTDI device: it should end in FA AA but ends in " +
                     hexBytes(reply_.data() + expected - 2, 2) + " (the reply is out of step with the commands)");
@@ -205,9 +208,7 @@ bool MpsseBus::roundTrip() {
     return true;
 }
 
-bool MpsseBus::flush() {
-    return usable() && send();
-}
+bool MpsseBus::flush() { return usable() && send(); }
 
 bool MpsseBus::pause(std::uint64_t microseconds) {
     if (!usable()) return false;

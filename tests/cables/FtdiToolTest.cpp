@@ -13,9 +13,9 @@
 namespace vorant::cables::test {
 namespace {
 
+using ports::ftdi::FtdiUsbFailure;
 using vorant::test::FakeFtdiUsb;
 using vorant::test::FakeMpsse;
-using ports::ftdi::FtdiUsbFailure;
 using Args = std::vector<std::string>;
 
 std::string slurp(const std::filesystem::path& file) {
@@ -62,20 +62,25 @@ TEST_F(FtdiTool, IdentifiesProgramsReadsBackAndSetsQuadEnable) {
         std::function<void(const ToolRun&)> check;
     };
     const Step steps[] = {
-        {"idcode", {"--port", "ftdi", "--part", "auto", "idcode"},
+        {"idcode",
+         {"--port", "ftdi", "--part", "auto", "idcode"},
          [](const ToolRun& r) { EXPECT_TRUE(has(r.out, "EF4018")) << r.text(); }},
-        {"program", {"--port", "ftdi", "--part", "auto", "program", "image.bin", "-e", "-v"},
+        {"program",
+         {"--port", "ftdi", "--part", "auto", "program", "image.bin", "-e", "-v"},
          [this](const ToolRun&) { EXPECT_TRUE(flashBytes(image.size()) == image); }},
-        {"readback", {"--port", "ftdi,serial=FT4ABC12,speed=30M", "--part", "W25Q128JV", "readback", "-f", "out.bin"},
+        {"readback",
+         {"--port", "ftdi,serial=FT4ABC12,speed=30M", "--part", "W25Q128JV", "readback", "-f", "out.bin"},
          [this](const ToolRun&) {
              const std::string back = slurp(dir.path() / "out.bin");
              EXPECT_EQ(back.size(), flash.memory().size());
              EXPECT_TRUE(back == flashBytes(flash.memory().size()));
              EXPECT_EQ(mpsse.sckHz(), 30e6);
          }},
-        {"status", {"--port", "ftdi", "--part", "W25Q128JV", "status"},
+        {"status",
+         {"--port", "ftdi", "--part", "W25Q128JV", "status"},
          [](const ToolRun& r) { EXPECT_FALSE(r.out.empty()); }},
-        {"qe set", {"--port", "ftdi", "--part", "W25Q128JV", "qe", "set"},
+        {"qe set",
+         {"--port", "ftdi", "--part", "W25Q128JV", "qe", "set"},
          [this](const ToolRun&) { EXPECT_EQ(flash.status2() & 0x02, 0x02); }},
     };
     for (const Step& step : steps) {
@@ -113,11 +118,14 @@ TEST_F(FtdiTool, ACableThatFailsIsOneClearErrorNeverSuccess) {
          false},
         {"claimed by ftdi_sio", [](FakeMpsse&, FakeFtdiUsb& u) { u.openFailure = FtdiUsbFailure::Busy; }, idcode,
          "the kernel's ftdi_sio driver holds it", false},
-        {"two devices", [](FakeMpsse&, FakeFtdiUsb& u) { u.devices.push_back(FakeFtdiUsb::ft232h("FT9XYZ")); },
-         idcode, "2 FTDI devices found (ftdi:0403:6014,serial=FT4ABC12; ftdi:0403:6014,serial=FT9XYZ); say which with serial=",
+        {"two devices", [](FakeMpsse&, FakeFtdiUsb& u) { u.devices.push_back(FakeFtdiUsb::ft232h("FT9XYZ")); }, idcode,
+         "2 FTDI devices found (ftdi:0403:6014,serial=FT4ABC12; ftdi:0403:6014,serial=FT9XYZ); say which with serial=",
          false},
-        {"no such serial", [](FakeMpsse&, FakeFtdiUsb&) {}, {"--port", "ftdi,serial=NOPE", "idcode"},
-         "no FTDI device with serial NOPE", false},
+        {"no such serial",
+         [](FakeMpsse&, FakeFtdiUsb&) {},
+         {"--port", "ftdi,serial=NOPE", "idcode"},
+         "no FTDI device with serial NOPE",
+         false},
         {"not an MPSSE engine", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.noMpsse = true; }, idcode,
          "did not answer as an MPSSE engine: opcode AA should come back as FA AA, but nothing came back", true},
         // Read 1 is the engine check at open; read 2 the ID.
@@ -151,8 +159,9 @@ TEST_F(FtdiTool, PortsListsTheDevicesWithTheirSerials) {
     EXPECT_EQ(result.status, 0) << result.text();
     EXPECT_TRUE(has(result.out, "ftdi:0403:6014,serial=FT4ABC12 FT232H 'Single RS232-HS', serial FT4ABC12\n"))
         << result.text();
-    EXPECT_TRUE(has(result.out, "ftdi:0403:6010,serial=FT9XYZ FT2232H 'Dual RS232-HS', serial FT9XYZ, "
-                                "interfaces A and B\n"))
+    EXPECT_TRUE(has(result.out,
+                    "ftdi:0403:6010,serial=FT9XYZ FT2232H 'Dual RS232-HS', serial FT9XYZ, "
+                    "interfaces A and B\n"))
         << result.text();
 }
 

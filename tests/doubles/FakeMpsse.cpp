@@ -207,21 +207,48 @@ bool FakeMpsse::interpret(const std::uint8_t* bytes, std::size_t n) {
                 replies_.push_back(pins);
                 break;
             }
-            case 0x84: loopback_ = true; note("84"); break;
-            case 0x85: loopback_ = false; note("85"); break;
+            case 0x84:
+                loopback_ = true;
+                note("84");
+                break;
+            case 0x85:
+                loopback_ = false;
+                note("85");
+                break;
             case 0x86:
                 if (!need(2, "divisor")) return false;
                 note("86 " + hex(bytes + at, 2));
                 divisor_ = static_cast<std::uint16_t>(bytes[at] | (bytes[at + 1] << 8));
                 at += 2;
                 break;
-            case 0x87: note("87"); flushed_ = replies_.size(); break;
-            case 0x8A: divideBy5_ = false; note("8A"); break;
-            case 0x8B: divideBy5_ = true; note("8B"); break;
-            case 0x8C: threePhase_ = true; note("8C"); break;
-            case 0x8D: threePhase_ = false; note("8D"); break;
-            case 0x96: adaptive_ = true; note("96"); break;
-            case 0x97: adaptive_ = false; note("97"); break;
+            case 0x87:
+                note("87");
+                flushed_ = replies_.size();
+                break;
+            case 0x8A:
+                divideBy5_ = false;
+                note("8A");
+                break;
+            case 0x8B:
+                divideBy5_ = true;
+                note("8B");
+                break;
+            case 0x8C:
+                threePhase_ = true;
+                note("8C");
+                break;
+            case 0x8D:
+                threePhase_ = false;
+                note("8D");
+                break;
+            case 0x96:
+                adaptive_ = true;
+                note("96");
+                break;
+            case 0x97:
+                adaptive_ = false;
+                note("97");
+                break;
             case 0x8E:
             case 0x8F: {
                 const std::size_t field = opcode == 0x8E ? 1 : 2;
@@ -234,9 +261,16 @@ bool FakeMpsse::interpret(const std::uint8_t* bytes, std::size_t n) {
                 for (std::size_t i = 0; i < bits; ++i) clockOneBit((levels_ & kDoPin) != 0);
                 break;
             }
-            case 0x88: case 0x89: case 0x94: case 0x95: case 0x9C: case 0x9D: case 0x9E:
+            case 0x88:
+            case 0x89:
+            case 0x94:
+            case 0x95:
+            case 0x9C:
+            case 0x9D:
+            case 0x9E:
                 note(hexByte(opcode));
-                return refuse("MPSSE command " + hexByte(opcode) + " waits on or drives GPIO; this double does not model it");
+                return refuse("MPSSE command " + hexByte(opcode) +
+                              " waits on or drives GPIO; this double does not model it");
             default:
                 // The engine's answer to an opcode it does not know.
                 note(hexByte(opcode));
@@ -253,11 +287,14 @@ bool FakeMpsse::checkPinsForClocking(std::uint8_t opcode) {
     const std::string command = "command " + hexByte(opcode);
     if ((directions_ & kSckPin) == 0) return misused(command + " clocks with SCK (ADBUS0) not an output");
     if ((directions_ & kDoPin) == 0) return misused(command + " clocks with MOSI (ADBUS1) not an output");
-    if ((directions_ & kDiPin) != 0) return misused(command + " with MISO (ADBUS2) driven as an output, against the flash");
+    if ((directions_ & kDiPin) != 0)
+        return misused(command + " with MISO (ADBUS2) driven as an output, against the flash");
     if ((levels_ & kSckPin) != 0) return misused(command + " starts with SCK high; SPI mode 0 idles low");
-    if (chipSelectHigh()) return misused(command + " clocks data with chip select (ADBUS" + std::to_string(chipSelectPin_) + ") high");
+    if (chipSelectHigh())
+        return misused(command + " clocks data with chip select (ADBUS" + std::to_string(chipSelectPin_) + ") high");
     if (threePhase_) return misused(command + " with 3-phase clocking on (the flash wants one edge per bit)");
-    if (adaptive_) return misused(command + " with adaptive clocking on: the engine waits for RTCK, which the flash never drives");
+    if (adaptive_)
+        return misused(command + " with adaptive clocking on: the engine waits for RTCK, which the flash never drives");
     return true;
 }
 
@@ -333,8 +370,10 @@ bool FakeMpsse::clockData(std::uint8_t opcode, const std::uint8_t* bytes, std::s
             const bool in = clockOneBit(((value >> bit) & 1) != 0);
             // MSB first shifts in from bit 0 (a short read is right-aligned);
             // LSB first shifts in from bit 7 (left-aligned).
-            if (lsbFirst) captured = static_cast<std::uint8_t>((captured >> 1) | (in ? 0x80 : 0));
-            else captured = static_cast<std::uint8_t>((captured << 1) | (in ? 1 : 0));
+            if (lsbFirst)
+                captured = static_cast<std::uint8_t>((captured >> 1) | (in ? 0x80 : 0));
+            else
+                captured = static_cast<std::uint8_t>((captured << 1) | (in ? 1 : 0));
         }
         if (reads) replies_.push_back(captured);
     }
