@@ -131,6 +131,8 @@ TEST_F(FtdiTool, ACableThatFailsIsOneClearErrorNeverSuccess) {
         // Read 1 is the engine check at open; read 2 the ID.
         {"short reply", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.shortReplyAtRead = 2; }, idcode,
          "a short or late reply from the FTDI device: 4 of the 5 bytes expected", true},
+        {"reply out of step", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.strayByteAtRead = 2; }, idcode,
+         "a malformed reply from the FTDI device: it should end in FA AA but ends in 18 FA", true},
         {"unplugged while programming", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.vanishAfterWrites = 40; }, program,
          "the FTDI device is gone from USB", true},
         {"a write that fails", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.failWrite = 30; }, program,

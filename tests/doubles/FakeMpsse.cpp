@@ -157,6 +157,10 @@ bool FakeMpsse::read(std::span<std::uint8_t> into, std::size_t& got, std::chrono
     const std::uint64_t number = ++readCount_;
     if (faults.failRead > 0 && number == static_cast<std::uint64_t>(faults.failRead))
         return refuse("usb bulk read failed (LIBUSB_ERROR_IO)");
+    if (faults.strayByteAtRead > 0 && number == static_cast<std::uint64_t>(faults.strayByteAtRead)) {
+        replies_.push_front(0x5A);
+        ++flushed_;
+    }
     std::size_t available = std::min(into.size(), replies_.size());
     if (available > flushed_) {
         // The chip holds a reply nobody flushed until its latency timer runs out.

@@ -45,6 +45,7 @@ public:
         int failRead = 0;           // this read (from 1) fails
         int vanishAfterWrites = 0;  // after this many writes the device is gone from USB
         int shortReplyAtRead = 0;   // this read loses the last byte the chip sent
+        int strayByteAtRead = 0;    // this read finds a stray byte ahead of the reply
         bool noMpsse = false;       // the channel never enters MPSSE mode (not an H chip)
         // The engine as another program left it: divide-by-5, 3-phase
         // clocking, adaptive clocking and loopback all on.
