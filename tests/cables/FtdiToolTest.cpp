@@ -6,6 +6,7 @@
 #include "tests/doubles/FakeMpsse.h"
 #include "tests/support/TestParts.h"
 
+#include <algorithm>
 #include <fstream>
 #include <functional>
 #include <random>
@@ -148,6 +149,9 @@ TEST_F(FtdiTool, ACableThatFailsIsOneClearErrorNeverSuccess) {
         EXPECT_TRUE(has(result.err, c.message)) << c.name << "\n" << result.text();
         EXPECT_FALSE(has(result.out + result.err, "succeeded")) << c.name << "\n" << result.text();
         EXPECT_EQ(device.writeCount() > 0, c.reachesTheSeam) << c.name;
+        if (!c.reachesTheSeam) {
+            EXPECT_EQ(std::count(result.err.begin(), result.err.end(), '\n'), 1) << c.name << "\n" << result.text();
+        }
         EXPECT_EQ(device.misuse, std::vector<std::string>{}) << c.name;
     }
 }
