@@ -115,10 +115,10 @@ bool MpsseBus::start() {
     std::size_t got = 0;
     if (!io_->read(answer, got, kReplySlack)) return ioFailure("reading the MPSSE synchronisation");
     if (got != 2 || answer[0] != kBadCommandEcho || answer[1] != kCheckOpcode)
-        return fail(
-            "the device did not answer as an MPSSE engine: opcode AA should come back as FA AA, but " +
-            (got == 0 ? std::string("nothing came back within 1000 ms") : "it answered " + hexBytes(answer, got)) +
-            "; is this an FT232H, FT2232H or FT4232H, on interface A or B?");
+        return fail("the device did not answer as an MPSSE engine: opcode AA should come back as FA AA, but " +
+                    (got == 0 ? "nothing came back within " + std::to_string(kReplySlack.count()) + " ms"
+                              : "it answered " + hexBytes(answer, got)) +
+                    "; is this an FT232H, FT2232H or FT4232H, on interface A or B?");
     const std::uint16_t divisor = settings_.divisor;
     held_ = {kDivideBy5Off,
              kSetDivisor,
@@ -172,8 +172,6 @@ bool MpsseBus::send() {
     held_.clear();
     heldBits_ = 0;
     if (!written) return ioFailure("a USB write of " + std::to_string(size) + " bytes");
-    ++usbWrites_;
-    bytesWritten_ += size;
     return true;
 }
 
@@ -190,7 +188,6 @@ bool MpsseBus::roundTrip() {
     reply_.assign(expected, 0);
     std::size_t got = 0;
     if (!io_->read(reply_, got, timeout)) return ioFailure("a USB read of " + std::to_string(expected) + " bytes");
-    ++usbReads_;
     replyBytes_ = 0;
     if (got != expected)
         return fail("a short or late reply from the FTDI device: " + std::to_string(got) + " of the " +

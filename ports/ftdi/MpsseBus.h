@@ -46,11 +46,6 @@ public:
     std::string error() const override { return error_; }
     bool lost() const override { return io_->lost(); }
 
-    // USB writes and reads so far, for the benchmark.
-    std::uint64_t usbWrites() const { return usbWrites_; }
-    std::uint64_t usbReads() const { return usbReads_; }
-    std::uint64_t bytesWritten() const { return bytesWritten_; }
-
 private:
     // Where a run of reply bytes goes.
     struct ReplyTarget {
@@ -78,7 +73,6 @@ private:
     std::vector<std::uint8_t> reply_;
     std::string error_;
     bool broken_ = false;
-    std::uint64_t usbWrites_ = 0, usbReads_ = 0, bytesWritten_ = 0;
 };
 
 }  // namespace vorant::ports::ftdi
