@@ -6,6 +6,9 @@
 #if VORANT_HAVE_OPENOCD
 #include "ports/openocd/OpenOcdPort.h"
 #endif
+#if VORANT_HAVE_FTDI
+#include "ports/ftdi/FtdiPort.h"
+#endif
 #include "ports/svf/SvfPort.h"
 #if VORANT_HAVE_SPIDEV
 #include "ports/spidev/SpidevPort.h"
@@ -54,6 +57,9 @@ const std::vector<PortInfo>& portTable() {
 #if VORANT_HAVE_SPIDEV
         spidev::spidevPortInfo(),
 #endif
+#if VORANT_HAVE_FTDI
+        ftdi::ftdiPortInfo(),
+#endif
     };
     return table;
 }
@@ -67,6 +73,9 @@ const std::vector<std::string>& portsLeftOut() {
 #endif
 #if !VORANT_HAVE_SPIDEV
         "spidev (Linux only)",
+#endif
+#if !VORANT_HAVE_FTDI
+        "ftdi (needs libftdi1)",
 #endif
     };
     return names;

@@ -16,4 +16,6 @@ build/ci/bin/vorant-block-bench
 build/ci/bin/vorant-tool-bench
 # The spidev cable's ioctls per page and per transaction, through its double (Linux builds).
 if [ -x build/ci/bin/vorant-spidev-bench ]; then build/ci/bin/vorant-spidev-bench; fi
+# Bytes and USB round trips per page on the FTDI cable (where libftdi1 is there).
+if [ -x build/ci/bin/vorant-ftdi-bench ]; then build/ci/bin/vorant-ftdi-bench; fi
 ctest --preset ci

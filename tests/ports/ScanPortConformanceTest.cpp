@@ -14,6 +14,9 @@
 #if VORANT_HAVE_SPIDEV
 #include "tests/doubles/FakeSpidev.h"
 #endif
+#if VORANT_HAVE_FTDI
+#include "tests/doubles/FakeMpsse.h"
+#endif
 #include "tests/support/TestParts.h"
 
 #include <gtest/gtest.h>
@@ -176,9 +179,39 @@ struct SpidevInstance {
 #define VORANT_SPIDEV_INSTANCE
 #endif
 
+#if VORANT_HAVE_FTDI
+// The FTDI cable through its row, with the MPSSE double behind the seam;
+// the engine starts as another program left it.
+class FtdiOverDouble final : public Port {
+public:
+    explicit FtdiOverDouble(const PortContext& context)
+        : flash_(sim::FlashConfig::fromPartDatabase(context.chipName)), mpsse_(flash_), usb_(&mpsse_) {
+        mpsse_.faults.leftoverState = true;
+        usb_.devices = {vorant::test::FakeFtdiUsb::ft232h()};
+        port_ = findPort("ftdi")->open(parsePortAddress("ftdi"), context);
+    }
+    ~FtdiOverDouble() override { EXPECT_EQ(mpsse_.misuse, std::vector<std::string>{}); }
+    ScanPort& scan() override { return port_->scan(); }
+
+private:
+    sim::FlashModel flash_;
+    vorant::test::FakeMpsse mpsse_;
+    vorant::test::FakeFtdiUsb usb_;
+    std::unique_ptr<Port> port_;
+};
+struct FtdiInstance {
+    static constexpr const char* kAddress = "ftdi";
+    static constexpr bool kReadsBack = true;
+    static std::unique_ptr<Port> open(const PortContext& context) { return std::make_unique<FtdiOverDouble>(context); }
+};
+#define VORANT_FTDI_INSTANCE , FtdiInstance
+#else
+#define VORANT_FTDI_INSTANCE
+#endif
+
 using Instances =
     ::testing::Types<SimInstance, SvfInstance, BoardJtagSpiInstance, BoardInAChainInstance, BoardShiftDrInstance,
-                     OpenOcdInstance VORANT_SPIDEV_INSTANCE>;
+                     OpenOcdInstance VORANT_SPIDEV_INSTANCE VORANT_FTDI_INSTANCE>;
 TYPED_TEST_SUITE(ScanPortConformance, Instances);
 
 TYPED_TEST(ScanPortConformance, StartsHealthyAndSaysWhatItIs) {

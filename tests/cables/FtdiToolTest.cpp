@@ -1,0 +1,184 @@
+// The whole tool over the FTDI cable, with the MPSSE double behind the
+// seam and a simulated W25Q128JV behind the double.
+
+#include "ports/sim/FlashModel.h"
+#include "tests/cables/InProcessTool.h"
+#include "tests/doubles/FakeMpsse.h"
+#include "tests/support/TestParts.h"
+
+#include <algorithm>
+#include <fstream>
+#include <functional>
+#include <random>
+
+namespace vorant::cables::test {
+namespace {
+
+using ports::ftdi::FtdiUsbFailure;
+using vorant::test::FakeFtdiUsb;
+using vorant::test::FakeMpsse;
+using Args = std::vector<std::string>;
+
+std::string slurp(const std::filesystem::path& file) {
+    std::ifstream in(file, std::ios::binary);
+    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+}
+
+std::string randomBytes(std::size_t count, unsigned seed) {
+    std::mt19937 generator(seed);
+    std::string bytes(count, '\0');
+    for (char& byte : bytes) byte = static_cast<char>(generator() >> 24);
+    return bytes;
+}
+
+bool has(const std::string& text, const std::string& part) { return text.find(part) != std::string::npos; }
+
+class FtdiTool : public ::testing::Test {
+protected:
+    static void SetUpTestSuite() { vorant::test::loadShippedParts(); }
+    void SetUp() override {
+        mpsse.faults.leftoverState = true;
+        usb.devices = {FakeFtdiUsb::ft232h()};
+        std::ofstream(dir.path() / "image.bin", std::ios::binary) << image;
+    }
+    void TearDown() override { EXPECT_EQ(mpsse.misuse, std::vector<std::string>{}); }
+    ToolRun run(const Args& args) { return runToolInProcess(args, dir.path()); }
+    std::string flashBytes(std::size_t count) const {
+        return std::string(flash.memory().begin(), flash.memory().begin() + static_cast<std::ptrdiff_t>(count));
+    }
+
+    ScratchFolder dir;
+    const std::string image = randomBytes(100'000, 7);
+    sim::FlashModel flash{sim::FlashConfig::fromPartDatabase("W25Q128JV")};
+    FakeMpsse mpsse{flash};
+    FakeFtdiUsb usb{&mpsse};
+};
+
+// One flash through a session of runs, each checked by what it left.
+TEST_F(FtdiTool, IdentifiesProgramsReadsBackAndSetsQuadEnable) {
+    mpsse.keepLog = mpsse.keepWrites = false;  // a 16 MiB readback
+    struct Step {
+        const char* name;
+        Args args;
+        std::function<void(const ToolRun&)> check;
+    };
+    const Step steps[] = {
+        {"idcode",
+         {"--port", "ftdi", "--part", "auto", "idcode"},
+         [](const ToolRun& r) { EXPECT_TRUE(has(r.out, "EF4018")) << r.text(); }},
+        {"program",
+         {"--port", "ftdi", "--part", "auto", "program", "image.bin", "-e", "-v"},
+         [this](const ToolRun&) { EXPECT_TRUE(flashBytes(image.size()) == image); }},
+        {"readback",
+         {"--port", "ftdi,serial=FT4ABC12,speed=30M", "--part", "W25Q128JV", "readback", "-f", "out.bin"},
+         [this](const ToolRun&) {
+             const std::string back = slurp(dir.path() / "out.bin");
+             EXPECT_EQ(back.size(), flash.memory().size());
+             EXPECT_TRUE(back == flashBytes(flash.memory().size()));
+             EXPECT_EQ(mpsse.sckHz(), 30e6);
+         }},
+        {"status",
+         {"--port", "ftdi", "--part", "W25Q128JV", "status"},
+         [](const ToolRun& r) { EXPECT_FALSE(r.out.empty()); }},
+        {"qe set",
+         {"--port", "ftdi", "--part", "W25Q128JV", "qe", "set"},
+         [this](const ToolRun&) { EXPECT_EQ(flash.status2() & 0x02, 0x02); }},
+    };
+    for (const Step& step : steps) {
+        const ToolRun result = run(step.args);
+        ASSERT_EQ(result.status, 0) << step.name << "\n" << result.text();
+        step.check(result);
+        EXPECT_EQ(mpsse.latencyWaits(), 0u) << step.name << ": a reply waited for the latency timer";
+    }
+}
+
+// Whatever goes wrong with the cable: exit 1 with one line naming the
+// cause, never success; where the cable cannot be opened nothing reaches
+// the seam.
+TEST_F(FtdiTool, ACableThatFailsIsOneClearErrorNeverSuccess) {
+    struct Case {
+        const char* name;
+        std::function<void(FakeMpsse&, FakeFtdiUsb&)> arrange;
+        Args args;
+        std::string message;
+        bool reachesTheSeam;
+    };
+    const Args program = {"--port", "ftdi", "--part", "W25Q128JV", "program", "image.bin", "-e", "-v"};
+    const Args idcode = {"--port", "ftdi", "--part", "auto", "idcode"};
+    const Case cases[] = {
+        {"absent", [](FakeMpsse&, FakeFtdiUsb& u) { u.devices.clear(); }, idcode,
+         "no FTDI device found (looked for 0403:6014 (FT232H), 0403:6010 (FT2232H), 0403:6011 (FT4232H))", false},
+        {"no permission",
+         [](FakeMpsse&, FakeFtdiUsb& u) {
+             u.openFailure = FtdiUsbFailure::Permission;
+             u.openFailureDetail = "no permission to open it";
+         },
+         idcode,
+         "no permission to open it; add the udev rule SUBSYSTEM==\"usb\", ATTR{idVendor}==\"0403\", "
+         "ATTR{idProduct}==\"6014\", MODE=\"0660\", GROUP=\"plugdev\"",
+         false},
+        {"claimed by ftdi_sio", [](FakeMpsse&, FakeFtdiUsb& u) { u.openFailure = FtdiUsbFailure::Busy; }, idcode,
+         "the kernel's ftdi_sio driver holds it", false},
+        {"two devices", [](FakeMpsse&, FakeFtdiUsb& u) { u.devices.push_back(FakeFtdiUsb::ft232h("FT9XYZ")); }, idcode,
+         "2 FTDI devices found (ftdi:0403:6014,serial=FT4ABC12; ftdi:0403:6014,serial=FT9XYZ); say which with serial=",
+         false},
+        {"no such serial",
+         [](FakeMpsse&, FakeFtdiUsb&) {},
+         {"--port", "ftdi,serial=NOPE", "idcode"},
+         "no FTDI device with serial NOPE",
+         false},
+        {"not an MPSSE engine", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.noMpsse = true; }, idcode,
+         "did not answer as an MPSSE engine: opcode AA should come back as FA AA, but nothing came back", true},
+        // Read 1 is the engine check at open; read 2 the ID.
+        {"short reply", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.shortReplyAtRead = 2; }, idcode,
+         "a short or late reply from the FTDI device: 4 of the 5 bytes expected", true},
+        {"reply out of step", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.strayByteAtRead = 2; }, idcode,
+         "a malformed reply from the FTDI device: it should end in FA AA but ends in 18 FA", true},
+        {"unplugged while programming", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.vanishAfterWrites = 40; }, program,
+         "the FTDI device is gone from USB", true},
+        {"a write that fails", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.failWrite = 30; }, program,
+         "LIBUSB_ERROR_TIMEOUT", true},
+    };
+    for (const Case& c : cases) {
+        FakeMpsse device{flash};
+        FakeFtdiUsb fakeUsb{&device};
+        fakeUsb.devices = {FakeFtdiUsb::ft232h()};
+        c.arrange(device, fakeUsb);
+        const ToolRun result = run(c.args);
+        EXPECT_EQ(result.status, 1) << c.name << "\n" << result.text();
+        EXPECT_TRUE(has(result.err, c.message)) << c.name << "\n" << result.text();
+        EXPECT_FALSE(has(result.out + result.err, "succeeded")) << c.name << "\n" << result.text();
+        EXPECT_EQ(device.writeCount() > 0, c.reachesTheSeam) << c.name;
+        if (!c.reachesTheSeam) {
+            EXPECT_EQ(std::count(result.err.begin(), result.err.end(), '\n'), 1) << c.name << "\n" << result.text();
+        }
+        EXPECT_EQ(device.misuse, std::vector<std::string>{}) << c.name;
+    }
+}
+
+TEST_F(FtdiTool, PortsListsTheDevicesWithTheirSerials) {
+    usb.devices.push_back(FakeFtdiUsb::ft232h("FT9XYZ"));
+    usb.devices.back().id.product = 0x6010;
+    usb.devices.back().chip = ports::ftdi::FtdiChip::FT2232H;
+    usb.devices.back().description = "Dual RS232-HS";
+    const ToolRun result = run({"ports"});
+    EXPECT_EQ(result.status, 0) << result.text();
+    EXPECT_TRUE(has(result.out, "ftdi:0403:6014,serial=FT4ABC12 FT232H 'Single RS232-HS', serial FT4ABC12\n"))
+        << result.text();
+    EXPECT_TRUE(has(result.out,
+                    "ftdi:0403:6010,serial=FT9XYZ FT2232H 'Dual RS232-HS', serial FT9XYZ, "
+                    "interfaces A and B\n"))
+        << result.text();
+}
+
+// A channel the chip does not have is the user's mistake: exit 2, nothing
+// opened.
+TEST_F(FtdiTool, AnFt232hHasNoInterfaceB) {
+    const ToolRun result = run({"--port", "ftdi,interface=B", "idcode"});
+    EXPECT_EQ(result.status, 2) << result.text();
+    EXPECT_TRUE(has(result.err, "has one channel, A")) << result.text();
+    EXPECT_EQ(usb.log, std::vector<std::string>{"list 0403:6014 0403:6010 0403:6011"});
+}
+
+}  // namespace
+}  // namespace vorant::cables::test
