@@ -44,7 +44,9 @@ public:
     bool flush() override;
     bool pause(std::uint64_t microseconds) override;
     std::string error() const override { return error_; }
-    bool lost() const override { return io_->lost(); }
+    // A bus that failed stays failed for the run (see fail()), so every
+    // further call would fail too: polling on is pointless.
+    bool lost() const override { return broken_ || io_->lost(); }
 
 private:
     // Where a run of reply bytes goes.
