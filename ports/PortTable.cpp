@@ -1,6 +1,9 @@
 #include "ports/PortTable.h"
 
 #include "ports/SimulatedPlayback.h"
+#if VORANT_HAVE_CH341A
+#include "ports/ch341a/Ch341aPort.h"
+#endif
 #include "ports/jtag/board/BoardPort.h"
 #include "ports/sim/SimPort.h"
 #if VORANT_HAVE_OPENOCD
@@ -48,6 +51,9 @@ const std::vector<PortInfo>& portTable() {
 #if VORANT_HAVE_OPENOCD
         openocd::openOcdPortInfo(),
 #endif
+#if VORANT_HAVE_CH341A
+        ch341a::ch341aPortInfo(),
+#endif
     };
     return table;
 }
@@ -58,6 +64,9 @@ const std::vector<std::string>& portsLeftOut() {
     static const std::vector<std::string> names = {
 #if !VORANT_HAVE_OPENOCD
         "openocd (needs POSIX sockets)",
+#endif
+#if !VORANT_HAVE_CH341A
+        "ch341a (needs libusb-1.0)",
 #endif
     };
     return names;
