@@ -14,4 +14,6 @@ build/ci/bin/vorant-bench
 build/ci/bin/vorant-block-bench
 # The tool from outside: CPU beside flashrom's emulated write, peak memory.
 build/ci/bin/vorant-tool-bench
+# USB transfers and packets per page through the CH341A cable (where libusb is there).
+if [[ -x build/ci/bin/vorant-ch341a-bench ]]; then build/ci/bin/vorant-ch341a-bench; fi
 ctest --preset ci
