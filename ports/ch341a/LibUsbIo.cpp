@@ -6,6 +6,8 @@
 
 #include <libusb.h>
 
+#include <algorithm>
+
 namespace vorant::ports::ch341a {
 
 namespace {
