@@ -57,6 +57,13 @@ FakeCh341a::FakeCh341a(sim::FlashModel& flash) : flash_(flash) { flash_.setClock
 
 std::unique_ptr<ports::ch341a::Ch341Io> FakeCh341a::connect() { return std::make_unique<Connection>(*this); }
 
+// A long run (a 16 MiB readback is a million packets) keeps its latest
+// lines only.
+void FakeCh341a::note(std::vector<std::string>& lines, std::string line) {
+    if (lines.size() >= kKeptLines) lines.erase(lines.begin(), lines.begin() + kKeptLines / 2);
+    lines.push_back(std::move(line));
+}
+
 BulkResult FakeCh341a::result(BulkResult outcome, const std::string& error) {
     error_ = error;
     return outcome;
@@ -64,7 +71,7 @@ BulkResult FakeCh341a::result(BulkResult outcome, const std::string& error) {
 
 bool FakeCh341a::refuse(const std::string& why) {
     refusal = why;
-    log.push_back("refused: " + why);
+    note(log, "refused: " + why);
     return false;
 }
 
@@ -72,17 +79,17 @@ BulkResult FakeCh341a::bulkOut(const std::uint8_t* data, std::size_t length) {
     if (gone_) return result(BulkResult::Failed, kNoDevice);
     ++outTransfers;
     outBytes += length;
-    transfers.push_back(hex(data, length));
+    note(transfers, hex(data, length));
     // A full packet goes on with the next; a short one ends the transfer.
     for (std::size_t offset = 0; offset < length; offset += kPacket) {
         ++packets;
         if (packets == vanishAtPacket) {
             gone_ = true;
-            log.push_back("unplugged");
+            note(log, "unplugged");
             return result(BulkResult::Failed, kNoDevice);
         }
         if (packets == failAtPacket) {
-            log.push_back("transfer failed");
+            note(log, "transfer failed");
             return result(BulkResult::Failed, "LIBUSB_ERROR_IO: Input/Output Error");
         }
         if (!packet(data + offset, std::min(kPacket, length - offset))) {
@@ -103,7 +110,7 @@ BulkResult FakeCh341a::bulkIn(std::uint8_t* data, std::size_t capacity, std::siz
     if (answer.size() > capacity) return result(BulkResult::Failed, "LIBUSB_ERROR_OVERFLOW: Overflow");
     std::copy(answer.begin(), answer.end(), data);
     received = answer.size();
-    log.push_back("in " + std::to_string(received));
+    note(log, "in " + std::to_string(received));
     return BulkResult::Done;
 }
 
@@ -121,7 +128,7 @@ bool FakeCh341a::streamSetup(const std::uint8_t* bytes, std::size_t length) {
     if (length < 3 || (bytes[1] & 0xF8) != 0x60 || bytes[2] != 0x00)
         return refuse("stream setup is not AA 60|mode 00: " + hex(bytes, std::min<std::size_t>(length, 3)));
     streamMode_ = bytes[1] & 0x07;
-    log.push_back("stream " + hex(bytes + 1, 1));
+    note(log, "stream " + hex(bytes + 1, 1));
     return true;
 }
 
@@ -152,7 +159,7 @@ bool FakeCh341a::uioStream(const std::uint8_t* bytes, std::size_t length) {
             break;
         default:
             if (sub == 0x20) {
-                log.push_back(line);
+                note(log, line);
                 return true;
             }
             if (sub != 0x00) return refuse("unknown UIO sub-command " + hex(&sub, 1));
@@ -189,7 +196,7 @@ bool FakeCh341a::spiStream(const std::uint8_t* bytes, std::size_t length) {
     std::vector<std::uint8_t> toFlash(count), fromFlash(count);
     for (std::size_t i = 0; i < count; ++i) toFlash[i] = mirrored(bytes[1 + i]);
     flash_.clockBytes(toFlash.data(), fromFlash.data(), count);
-    log.push_back("spi " + hex(toFlash.data(), count));
+    note(log, "spi " + hex(toFlash.data(), count));
     std::vector<std::uint8_t> answer(count);
     for (std::size_t i = 0; i < count; ++i) answer[i] = mirrored(fromFlash[i]);
     if (++spiPackets_ == answerFaultAtSpiPacket) {

@@ -32,6 +32,7 @@ namespace vorant::test {
 class FakeCh341a {
 public:
     static constexpr std::uint32_t kSpiClockHz = 1'400'000;
+    static constexpr std::size_t kKeptLines = 20000;
 
     // Sets the flash's clock to the programmer's.
     explicit FakeCh341a(sim::FlashModel& flash);
@@ -40,8 +41,9 @@ public:
     // (its log, its flash) stays the test's.
     std::unique_ptr<ports::ch341a::Ch341Io> connect();
 
+    // The latest lines (at most kKeptLines; older ones are dropped).
     std::vector<std::string> log;
-    // Every OUT transfer as sent, "AB B6 20 00 .. A8 60".
+    // Every OUT transfer as sent, "AB B6 20 00 .. A8 60", the latest likewise.
     std::vector<std::string> transfers;
     std::string refusal;
     std::uint64_t outTransfers = 0, inTransfers = 0, outBytes = 0, packets = 0;
@@ -73,6 +75,7 @@ private:
     bool spiStream(const std::uint8_t* bytes, std::size_t length);
     bool chipSelectFollowsPins();
     bool refuse(const std::string& why);
+    static void note(std::vector<std::string>& lines, std::string line);
     BulkResult result(BulkResult outcome, const std::string& error);
 
     sim::FlashModel& flash_;
