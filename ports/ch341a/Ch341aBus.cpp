@@ -78,9 +78,13 @@ void Ch341aBus::appendPendingPins(bool padded) {
 
 bool Ch341aBus::send(const std::vector<std::uint8_t>& bytes) {
     switch (io_->bulkOut(bytes.data(), bytes.size(), kTransferTimeout)) {
-    case BulkResult::Done: pendingPins_.clear(); return true;
-    case BulkResult::TimedOut: return fail("sending to the CH341A timed out after " + kTimeoutText);
-    case BulkResult::Failed: break;
+        case BulkResult::Done:
+            pendingPins_.clear();
+            return true;
+        case BulkResult::TimedOut:
+            return fail("sending to the CH341A timed out after " + kTimeoutText);
+        case BulkResult::Failed:
+            break;
     }
     return fail("sending to the CH341A failed: " + io_->error());
 }
@@ -90,13 +94,14 @@ bool Ch341aBus::receive(std::uint8_t* into, std::size_t clocked) {
     std::size_t received = 0;
     const std::string packet = "an SPI packet of " + std::to_string(clocked) + " bytes";
     switch (io_->bulkIn(answer, sizeof answer, received, kTransferTimeout)) {
-    case BulkResult::Done: break;
-    case BulkResult::TimedOut:
-        outOfStep_ = true;
-        return fail("the CH341A did not answer " + packet + " within " + kTimeoutText);
-    case BulkResult::Failed:
-        outOfStep_ = true;
-        return fail("reading the CH341A's answer to " + packet + " failed: " + io_->error());
+        case BulkResult::Done:
+            break;
+        case BulkResult::TimedOut:
+            outOfStep_ = true;
+            return fail("the CH341A did not answer " + packet + " within " + kTimeoutText);
+        case BulkResult::Failed:
+            outOfStep_ = true;
+            return fail("reading the CH341A's answer to " + packet + " failed: " + io_->error());
     }
     if (received != clocked) {
         outOfStep_ = true;
@@ -111,9 +116,13 @@ bool Ch341aBus::drain() {
     for (int stale = 0; stale < kMostStaleAnswers; ++stale) {
         std::size_t received = 0;
         switch (io_->bulkIn(answer, sizeof answer, received, kDrainTimeout)) {
-        case BulkResult::TimedOut: outOfStep_ = false; return true;
-        case BulkResult::Failed: return fail("reading the CH341A failed: " + io_->error());
-        case BulkResult::Done: break;
+            case BulkResult::TimedOut:
+                outOfStep_ = false;
+                return true;
+            case BulkResult::Failed:
+                return fail("reading the CH341A failed: " + io_->error());
+            case BulkResult::Done:
+                break;
         }
     }
     return fail("the CH341A keeps sending answers nobody asked for; unplug it and plug it in again");

@@ -34,7 +34,8 @@ std::optional<int> numberIn(const std::string& text, int most) {
 // "BUS:ADDR" as `vorant-spi ports` lists it.
 UsbLocation locationOf(const PortAddress& address) {
     const std::size_t colon = address.path.find(':');
-    const std::optional<int> bus = colon == std::string::npos ? std::nullopt : numberIn(address.path.substr(0, colon), 255);
+    const std::optional<int> bus =
+        colon == std::string::npos ? std::nullopt : numberIn(address.path.substr(0, colon), 255);
     const std::optional<int> device =
         colon == std::string::npos ? std::nullopt : numberIn(address.path.substr(colon + 1), 127);
     if (!bus || !device)
@@ -60,17 +61,18 @@ Ch341Device choose(const PortAddress& address) {
     if (!address.hasPath) {
         if (found.size() == 1) return found.front();
         if (found.empty())
-            unavailable(port + ": cannot open a CH341A: none is plugged in (no USB device 1a86:5512); plug it in "
+            unavailable(port +
+                        ": cannot open a CH341A: none is plugged in (no USB device 1a86:5512); plug it in "
                         "with its mode jumper in the SPI/I2C position (as a serial adapter it is 1a86:5523)");
-        throw PortError(PortError::Kind::BadRequest, port + ": cannot choose a CH341A: " +
-                                                         std::to_string(found.size()) + " are plugged in (" +
-                                                         list(found) + "); name one with --port ch341a:BUS:ADDR");
+        throw PortError(PortError::Kind::BadRequest,
+                        port + ": cannot choose a CH341A: " + std::to_string(found.size()) + " are plugged in (" +
+                            list(found) + "); name one with --port ch341a:BUS:ADDR");
     }
     const UsbLocation wanted = locationOf(address);
     for (const Ch341Device& device : found)
         if (device.bus == wanted.bus && device.address == wanted.address) return device;
-    unavailable(port + ": cannot open a CH341A: there is none at USB bus " + std::to_string(wanted.bus) +
-                " address " + std::to_string(wanted.address) + " (" +
+    unavailable(port + ": cannot open a CH341A: there is none at USB bus " + std::to_string(wanted.bus) + " address " +
+                std::to_string(wanted.address) + " (" +
                 (found.empty() ? std::string("none is plugged in") : "found: " + list(found)) +
                 "); give one that 'vorant-spi ports' lists");
 }
@@ -83,17 +85,18 @@ std::unique_ptr<Port> open(const PortAddress& address, const PortContext&) {
     const std::string failed = "--port " + address.text + ": cannot open the CH341A at USB bus " +
                                std::to_string(device.bus) + " address " + std::to_string(device.address) + ": ";
     switch (opening.refusal) {
-    case OpenRefusal::None: break;
-    case OpenRefusal::NoPermission:
-        unavailable(failed + "no permission (" + opening.detail + "); add the udev rule " + kUdevRule +
-                    " to a file in /etc/udev/rules.d/, reload the rules, replug the programmer and be in group "
-                    "plugdev");
-    case OpenRefusal::Busy:
-        unavailable(failed + "another program or driver holds it (" + opening.detail + "); close that program");
-    case OpenRefusal::Absent:
-        unavailable(failed + "it went away (" + opening.detail + "); plug it in again");
-    case OpenRefusal::Failed:
-        unavailable(failed + opening.detail + "; unplug the programmer and plug it in again");
+        case OpenRefusal::None:
+            break;
+        case OpenRefusal::NoPermission:
+            unavailable(failed + "no permission (" + opening.detail + "); add the udev rule " + kUdevRule +
+                        " to a file in /etc/udev/rules.d/, reload the rules, replug the programmer and be in group "
+                        "plugdev");
+        case OpenRefusal::Busy:
+            unavailable(failed + "another program or driver holds it (" + opening.detail + "); close that program");
+        case OpenRefusal::Absent:
+            unavailable(failed + "it went away (" + opening.detail + "); plug it in again");
+        case OpenRefusal::Failed:
+            unavailable(failed + opening.detail + "; unplug the programmer and plug it in again");
     }
     return openCh341aCable(std::move(opening.io), addressOf(device));
 }
@@ -128,8 +131,8 @@ const PortInfo& ch341aPortInfo() {
         };
         info.path = PathUse::Optional;
         info.pathName = "BUS:ADDR";
-        info.caps = {.readsBack = true, .records = false, .simulatesChip = false, .hasBusClock = false,
-                     .takesSimFaults = false};
+        info.caps = {
+            .readsBack = true, .records = false, .simulatesChip = false, .hasBusClock = false, .takesSimFaults = false};
         info.open = &open;
         info.discover = &discover;
         return info;

@@ -125,11 +125,15 @@ private:
 
 OpenRefusal refusalOf(int status) {
     switch (status) {
-    case LIBUSB_ERROR_ACCESS: return OpenRefusal::NoPermission;
-    case LIBUSB_ERROR_BUSY: return OpenRefusal::Busy;
-    case LIBUSB_ERROR_NO_DEVICE:
-    case LIBUSB_ERROR_NOT_FOUND: return OpenRefusal::Absent;
-    default: return OpenRefusal::Failed;
+        case LIBUSB_ERROR_ACCESS:
+            return OpenRefusal::NoPermission;
+        case LIBUSB_ERROR_BUSY:
+            return OpenRefusal::Busy;
+        case LIBUSB_ERROR_NO_DEVICE:
+        case LIBUSB_ERROR_NOT_FOUND:
+            return OpenRefusal::Absent;
+        default:
+            return OpenRefusal::Failed;
     }
 }
 
@@ -144,8 +148,8 @@ std::vector<Ch341Device> listDevices() {
     std::vector<Ch341Device> found;
     for (ssize_t i = 0; i < devices.count(); ++i)
         if (isCh341a(devices[i]))
-            found.push_back({libusb_get_bus_number(devices[i]), libusb_get_device_address(devices[i]),
-                             productString(devices[i])});
+            found.push_back(
+                {libusb_get_bus_number(devices[i]), libusb_get_device_address(devices[i]), productString(devices[i])});
     return found;
 }
 

@@ -118,12 +118,17 @@ TEST_P(Ch341aToolFailure, StopsTheRunAndSaysWhy) {
     EXPECT_TRUE(has(result.err, GetParam().message)) << result.text();
     EXPECT_FALSE(has(result.text(), "succeeded")) << result.text();
     EXPECT_FALSE(has(result.out, "EF4018")) << "a broken answer passed for an ID";
-    if (!GetParam().reachesDevice) { EXPECT_EQ(opens, 0); }
-    if (!GetParam().reachesDevice || refusal != OpenRefusal::None) { EXPECT_TRUE(device->transfers.empty()); }
+    if (!GetParam().reachesDevice) {
+        EXPECT_EQ(opens, 0);
+    }
+    if (!GetParam().reachesDevice || refusal != OpenRefusal::None) {
+        EXPECT_TRUE(device->transfers.empty());
+    }
 }
 
 const std::vector<std::string> kIdcode = {"--port", "ch341a", "--part", "auto", "idcode"};
 
+// clang-format off
 INSTANTIATE_TEST_SUITE_P(Rows, Ch341aToolFailure, ::testing::Values(
     FailureRow{"MalformedAnswer", kIdcode, [](Setting s) {
                    s.device.answerFaultAtSpiPacket = 1;
@@ -145,6 +150,7 @@ INSTANTIATE_TEST_SUITE_P(Rows, Ch341aToolFailure, ::testing::Values(
     FailureRow{"Busy", kIdcode, [](Setting s) { s.refusal = OpenRefusal::Busy; }, 1,
                "another program or driver holds it", true}),
     [](const auto& info) { return std::string(info.param.name); });
+// clang-format on
 
 TEST_F(Ch341aTool, PortsListsEachProgrammer) {
     present.push_back({3, 2, ""});

@@ -116,10 +116,14 @@ BulkResult FakeCh341a::bulkIn(std::uint8_t* data, std::size_t capacity, std::siz
 
 bool FakeCh341a::packet(const std::uint8_t* bytes, std::size_t length) {
     switch (bytes[0]) {
-    case 0xAA: return streamSetup(bytes, length);
-    case 0xAB: return uioStream(bytes, length);
-    case 0xA8: return spiStream(bytes, length);
-    default: return refuse("unknown command " + hex(bytes, 1));
+        case 0xAA:
+            return streamSetup(bytes, length);
+        case 0xAB:
+            return uioStream(bytes, length);
+        case 0xA8:
+            return spiStream(bytes, length);
+        default:
+            return refuse("unknown command " + hex(bytes, 1));
     }
 }
 
@@ -138,34 +142,36 @@ bool FakeCh341a::uioStream(const std::uint8_t* bytes, std::size_t length) {
         const std::uint8_t sub = bytes[i];
         char token[16];
         switch (sub & 0xC0) {
-        case 0x80:
-            pins_ = sub & 0x3F;
-            // The other pins as a programmer leaves them: MOSI and DOUT2
-            // high, SCK low, CS1# and CS2# high.
-            if ((pins_ & 0x3E) == 0x36) std::snprintf(token, sizeof token, " cs=%d", pins_ & kCs0);
-            else std::snprintf(token, sizeof token, " pins=%02X", pins_);
-            line += token;
-            if (!chipSelectFollowsPins()) return false;
-            break;
-        case 0x40:
-            directions_ = sub & 0x3F;
-            std::snprintf(token, sizeof token, " dir=%02X", directions_);
-            line += token;
-            if (!chipSelectFollowsPins()) return false;
-            break;
-        case 0xC0:
-            flash_.advance((sub & 0x3Fu) * 1000u);
-            line += " delay=" + std::to_string(sub & 0x3F);
-            break;
-        default:
-            if (sub == 0x20) {
-                note(log, line);
-                return true;
-            }
-            if (sub != 0x00) return refuse("unknown UIO sub-command " + hex(&sub, 1));
-            // Inputs read high (pull-ups), MISO included while deselected.
-            answers_.push_back({static_cast<std::uint8_t>(0xC0 | (pins_ & directions_) | (~directions_ & 0x3F))});
-            line += " sample";
+            case 0x80:
+                pins_ = sub & 0x3F;
+                // The other pins as a programmer leaves them: MOSI and DOUT2
+                // high, SCK low, CS1# and CS2# high.
+                if ((pins_ & 0x3E) == 0x36)
+                    std::snprintf(token, sizeof token, " cs=%d", pins_ & kCs0);
+                else
+                    std::snprintf(token, sizeof token, " pins=%02X", pins_);
+                line += token;
+                if (!chipSelectFollowsPins()) return false;
+                break;
+            case 0x40:
+                directions_ = sub & 0x3F;
+                std::snprintf(token, sizeof token, " dir=%02X", directions_);
+                line += token;
+                if (!chipSelectFollowsPins()) return false;
+                break;
+            case 0xC0:
+                flash_.advance((sub & 0x3Fu) * 1000u);
+                line += " delay=" + std::to_string(sub & 0x3F);
+                break;
+            default:
+                if (sub == 0x20) {
+                    note(log, line);
+                    return true;
+                }
+                if (sub != 0x00) return refuse("unknown UIO sub-command " + hex(&sub, 1));
+                // Inputs read high (pull-ups), MISO included while deselected.
+                answers_.push_back({static_cast<std::uint8_t>(0xC0 | (pins_ & directions_) | (~directions_ & 0x3F))});
+                line += " sample";
         }
     }
     return refuse("UIO stream without its end (20): " + hex(bytes, length));

@@ -65,9 +65,9 @@ TEST_F(Ch341aBusTest, WriteEnableAndStatusReadAreTheseBytes) {
     ASSERT_TRUE(scan.wait(0, true));
     EXPECT_EQ(fake.transfers, std::vector<std::string>({
                                   kSetup,
-                                  padded("AB B6 20") + " A8 60",     // CS0# low; 06h mirrored
+                                  padded("AB B6 20") + " A8 60",        // CS0# low; 06h mirrored
                                   padded("AB B7 B6 20") + " A8 A0 00",  // CS0# high, low; 05h mirrored, filler
-                                  "AB B7 20",                        // CS0# high before the wait
+                                  "AB B7 20",                           // CS0# high before the wait
                               }));
     EXPECT_EQ(fake.log, std::vector<std::string>({"stream 61", "uio cs=1 dir=3F", "uio cs=0", "spi 06", "in 1",
                                                   "uio cs=1 cs=0", "spi 05 00", "in 2", "uio cs=1"}));
@@ -106,14 +106,23 @@ TEST_F(Ch341aBusTest, AWrongLateOrMissingAnswerIsAFailureNeverData) {
     };
     // Packets 1 and 2 are the setup; the status read is packets 3 (CS) and 4 (A8).
     const Row rows[] = {
-        {"short", [](FakeCh341a& f) { f.answerFaultAtSpiPacket = 1;
-             f.answerSizeChange = -1; },
+        {"short",
+         [](FakeCh341a& f) {
+             f.answerFaultAtSpiPacket = 1;
+             f.answerSizeChange = -1;
+         },
          "the CH341A answered an SPI packet of 2 bytes with 1 bytes", false},
-        {"long", [](FakeCh341a& f) { f.answerFaultAtSpiPacket = 1;
-             f.answerSizeChange = 1; },
+        {"long",
+         [](FakeCh341a& f) {
+             f.answerFaultAtSpiPacket = 1;
+             f.answerSizeChange = 1;
+         },
          "the CH341A answered an SPI packet of 2 bytes with 3 bytes", false},
-        {"none", [](FakeCh341a& f) { f.answerFaultAtSpiPacket = 1;
-             f.answerWithheld = true; },
+        {"none",
+         [](FakeCh341a& f) {
+             f.answerFaultAtSpiPacket = 1;
+             f.answerWithheld = true;
+         },
          "the CH341A did not answer an SPI packet of 2 bytes within 1000 ms", false},
         {"transfer", [](FakeCh341a& f) { f.failAtPacket = 4; },
          "sending to the CH341A failed: LIBUSB_ERROR_IO: Input/Output Error", false},
