@@ -1,6 +1,9 @@
 #include "ports/PortTable.h"
 
 #include "ports/SimulatedPlayback.h"
+#if VORANT_HAVE_CH341A
+#include "ports/ch341a/Ch341aPort.h"
+#endif
 #include "ports/jtag/board/BoardPort.h"
 #include "ports/sim/SimPort.h"
 #if VORANT_HAVE_OPENOCD
@@ -60,6 +63,9 @@ const std::vector<PortInfo>& portTable() {
 #if VORANT_HAVE_FTDI
         ftdi::ftdiPortInfo(),
 #endif
+#if VORANT_HAVE_CH341A
+        ch341a::ch341aPortInfo(),
+#endif
     };
     return table;
 }
@@ -76,6 +82,9 @@ const std::vector<std::string>& portsLeftOut() {
 #endif
 #if !VORANT_HAVE_FTDI
         "ftdi (needs libftdi1)",
+#endif
+#if !VORANT_HAVE_CH341A
+        "ch341a (needs libusb-1.0)",
 #endif
     };
     return names;

@@ -18,4 +18,6 @@ build/ci/bin/vorant-tool-bench
 if [ -x build/ci/bin/vorant-spidev-bench ]; then build/ci/bin/vorant-spidev-bench; fi
 # Bytes and USB round trips per page on the FTDI cable (where libftdi1 is there).
 if [ -x build/ci/bin/vorant-ftdi-bench ]; then build/ci/bin/vorant-ftdi-bench; fi
+# USB transfers and packets per page through the CH341A cable (where libusb is there).
+if [[ -x build/ci/bin/vorant-ch341a-bench ]]; then build/ci/bin/vorant-ch341a-bench; fi
 ctest --preset ci

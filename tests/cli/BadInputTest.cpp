@@ -183,5 +183,18 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"QeRecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "qe", "set"}, 2, "W25Q16JV" + kNoQe}),
     [](const auto& info) { return std::string(info.param.name); });
 
+#if VORANT_HAVE_CH341A
+// The CH341A's clock is the chip's, so its address takes no key; its path
+// is BUS:ADDR. Both are refused before USB is looked at.
+INSTANTIATE_TEST_SUITE_P(Ch341a, BadInput, ::testing::Values(
+    BadCase{"Ch341aSpeedKey", {"--port", "ch341a,speed=1000000", "idcode"}, 2, "ch341a has no key 'speed'"},
+    BadCase{"Ch341aClock", {"--port", "ch341a", "--clock", "1000000", "idcode"}, 2,
+            "--clock sets the simulator's clock and does not apply to --port ch341a"},
+    BadCase{"Ch341aAddressWithoutDevice", {"--port", "ch341a:1", "idcode"}, 2, "'1' is not BUS:ADDR"},
+    BadCase{"Ch341aAddressOutOfRange", {"--port", "ch341a:1:200", "idcode"}, 2, "'1:200' is not BUS:ADDR"},
+    BadCase{"Ch341aAddressNotNumbers", {"--port", "ch341a:usb:5", "idcode"}, 2, "'usb:5' is not BUS:ADDR"}),
+    [](const auto& info) { return std::string(info.param.name); });
+#endif
+
 }  // namespace
 }  // namespace vorant::cli::test

@@ -17,6 +17,10 @@
 #if VORANT_HAVE_FTDI
 #include "tests/doubles/FakeMpsse.h"
 #endif
+#if VORANT_HAVE_CH341A
+#include "ports/ch341a/Ch341aPort.h"
+#include "tests/doubles/FakeCh341a.h"
+#endif
 #include "tests/support/TestParts.h"
 
 #include <gtest/gtest.h>
@@ -209,9 +213,35 @@ struct FtdiInstance {
 #define VORANT_FTDI_INSTANCE
 #endif
 
+#if VORANT_HAVE_CH341A
+// A CH341A programmer as its double gives it, the chip on its socket.
+class Ch341aOverDouble final : public Port {
+public:
+    explicit Ch341aOverDouble(const std::string& chip)
+        : flash_(sim::FlashConfig::fromPartDatabase(chip)), device_(flash_),
+          cable_(ch341a::openCh341aCable(device_.connect(), "ch341a:1:5")) {}
+    ScanPort& scan() override { return cable_->scan(); }
+
+private:
+    sim::FlashModel flash_;
+    vorant::test::FakeCh341a device_;
+    std::unique_ptr<Port> cable_;
+};
+struct Ch341aInstance {
+    static constexpr const char* kAddress = "ch341a";
+    static constexpr bool kReadsBack = true;
+    static std::unique_ptr<Port> open(const PortContext& context) {
+        return std::make_unique<Ch341aOverDouble>(context.chipName);
+    }
+};
+#define VORANT_CH341A_INSTANCE , Ch341aInstance
+#else
+#define VORANT_CH341A_INSTANCE
+#endif
+
 using Instances =
     ::testing::Types<SimInstance, SvfInstance, BoardJtagSpiInstance, BoardInAChainInstance, BoardShiftDrInstance,
-                     OpenOcdInstance VORANT_SPIDEV_INSTANCE VORANT_FTDI_INSTANCE>;
+                     OpenOcdInstance VORANT_SPIDEV_INSTANCE VORANT_FTDI_INSTANCE VORANT_CH341A_INSTANCE>;
 TYPED_TEST_SUITE(ScanPortConformance, Instances);
 
 TYPED_TEST(ScanPortConformance, StartsHealthyAndSaysWhatItIs) {
