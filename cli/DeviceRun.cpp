@@ -462,11 +462,13 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     }
     // A live port may still hold writes it batched: they go out now, and a
     // failure there fails the run.
+    std::string commitError;
     if (!run.session->caps().records) {
         try {
             run.session->commit();
         } catch (const ports::PortError& error) {
-            toolError(error.what());
+            commitError = error.what();
+            toolError(commitError);
             result = false;
         }
     }
@@ -481,7 +483,9 @@ int runDeviceOperation(const ToolOptions& options, const OperationRequest& reque
     // The port's own words for what went wrong: the device's messages name
     // only what it could see (a time-out, an erase that did not complete).
     if (!result && !cancelled) {
-        if (const char* reason = progressPort.failureReason()) toolError(reason);
+        // Said once: a cable that failed also fails the final flush.
+        if (const char* reason = progressPort.failureReason(); reason != nullptr && reason != commitError)
+            toolError(reason);
     }
     if (result && !cancelled && !run.session->port().outputMode()) {
         try {

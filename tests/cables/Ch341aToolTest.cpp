@@ -116,6 +116,9 @@ TEST_P(Ch341aToolFailure, StopsTheRunAndSaysWhy) {
     const ToolRun result = run(GetParam().args);
     EXPECT_EQ(result.status, GetParam().status) << result.text();
     EXPECT_TRUE(has(result.err, GetParam().message)) << result.text();
+    // The cause is said once.
+    const std::size_t first = result.err.find(GetParam().message);
+    EXPECT_EQ(result.err.find(GetParam().message, first + 1), std::string::npos) << result.text();
     EXPECT_FALSE(has(result.text(), "succeeded")) << result.text();
     EXPECT_FALSE(has(result.out, "EF4018")) << "a broken answer passed for an ID";
     if (!GetParam().reachesDevice) {
