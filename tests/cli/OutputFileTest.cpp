@@ -9,9 +9,6 @@
 namespace vorant::cli::test {
 namespace {
 
-// What a readback of a 2 MiB flash holds after `data` went in at 0.
-std::string flashWith(const std::string& data) { return std::string(kSimBytes, '\xff').replace(0, data.size(), data); }
-
 class OutputFiles : public ToolTest {
 protected:
     // A flash file holding an image, and the readback it gives.
@@ -134,7 +131,9 @@ TEST_F(OutputFiles, RecordingThroughALinkReplacesItsTargetOnlyWhenItSucceeds) {
         return Args{"--part", "W25Q16JV", "--port", std::string("svf:") + file, "program", "image.bin", "-e"};
     };
     // Writes past 64 KiB fail, as on a full disk.
-    EXPECT_EQ(run(record("job.svf"), 64 * 1024).status, 1);
+    const Result full = run(record("job.svf"), 64 * 1024);
+    EXPECT_EQ(full.status, 1) << full.text();
+    EXPECT_TRUE(has(full.err, "ERROR: job.svf could not be written (is the disk full?)\n")) << full.text();
     EXPECT_EQ(read("jobs/real.svf"), "// an older recording\n");
     ok(record("job.svf"));
     ok(record("plain.svf"));

@@ -150,6 +150,15 @@ protected:
 
 inline const Args kSim{"--part", "W25Q16JV", "--port", "sim:flash.bin"};
 inline constexpr std::size_t kSimBytes = 2 * 1024 * 1024;
+// What a readback of the 2 MiB flash holds after `data` went in at `offset`.
+inline std::string flashWith(const std::string& data, std::size_t offset = 0) {
+    return std::string(kSimBytes, '\xff').replace(offset, data.size(), data);
+}
+// The flash bytes of a flash file, without its status trailer.
+inline std::string flashBytes(const std::string& file) { return file.substr(0, kSimBytes); }
+inline bool srecCat(const std::string& arguments) {
+    return std::system(("srec_cat " + arguments + " >/dev/null 2>&1").c_str()) == 0;
+}
 
 // A part a user adds with --parts: the shipped Winbond family with 2 MiB
 // and the ID `id`; `keys` add or replace keys (TOML values; "" drops one).
