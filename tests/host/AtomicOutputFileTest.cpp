@@ -4,10 +4,10 @@
 #include "host/OutputTarget.h"
 #include "host/PendingOutputs.h"
 #include "host/VorantException.h"
+#include "tests/support/ScratchFolder.h"
 
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -25,19 +25,10 @@ std::string contents(const fs::path& file) {
 
 class AtomicOutput : public ::testing::Test {
 protected:
-    void SetUp() override {
-        // A folder of its own: ctest runs these tests side by side.
-        std::string name = (fs::temp_directory_path() / "vorant-atomic-XXXXXX").string();
-        ASSERT_NE(mkdtemp(name.data()), nullptr);
-        folder = name;
-        std::ofstream(folder / "old.bin") << "earlier contents";
-    }
-    void TearDown() override {
-        fs::permissions(folder / "old.bin", fs::perms::owner_all, fs::perm_options::add);
-        fs::remove_all(folder);
-    }
-    std::size_t entries() const { return static_cast<std::size_t>(std::distance(fs::directory_iterator(folder), {})); }
-    fs::path folder;
+    void SetUp() override { std::ofstream(folder / "old.bin") << "earlier contents"; }
+    std::size_t entries() const { return scratch.entries(); }
+    vorant::test::ScratchFolder scratch;
+    const fs::path& folder = scratch.path();
 };
 
 TEST_F(AtomicOutput, CommitReplacesTheTargetWhole) {

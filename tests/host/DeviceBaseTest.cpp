@@ -14,10 +14,6 @@ protected:
     void SetUp() override { vorant::test::addTestPart("BASEPART", vorant::test::w25q128Properties()); }
 };
 
-TEST_F(DeviceBase, UnknownPartsCannotBeDevices) {
-    EXPECT_THROW(SPIDevice("NO-SUCH-PART"), VorantException);
-}
-
 TEST_F(DeviceBase, UnsupportedOperationsSayItAndFail) {
     vorant::CapturingSink sink;
     vorant::ScopedSink scope(&sink);
