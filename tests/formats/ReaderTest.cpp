@@ -95,7 +95,7 @@ TEST(OpenConfigData, ExtensionPicksTheFormatIgnoringCaseAndUnusableInputIsRefuse
         writeFile(dir.file(name), hex);
         EXPECT_EQ(loadFlashImage(dir.file(name)).denseBytes(), (isHex ? Bytes{0xFF, 0xFF, 0x42} : Bytes(hex.begin(), hex.end()))) << name;
     }
-    fs::create_directory(dir.path / "folder.bin");
+    fs::create_directory(dir.path() / "folder.bin");
     writeFile(dir.file("locked.bin"), std::string("x"));
     fs::permissions(dir.file("locked.bin"), fs::perms::none);
     const struct { const char *name, *content, *reason; } cases[] = {
