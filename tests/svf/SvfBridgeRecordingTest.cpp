@@ -5,12 +5,12 @@
 
 #include "ports/jtag/Bridge.h"
 #include "ports/svf/SvfRecorder.h"
+#include "tests/support/ScratchFolder.h"
 
 #include <gtest/gtest.h>
 
 #include <filesystem>
 #include <fstream>
-#include <random>
 #include <sstream>
 
 namespace vorant::svf {
@@ -18,11 +18,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-struct Scratch {
-    fs::path path = fs::path(::testing::TempDir()) / ("vorant-svf-bridge-" + std::to_string(std::random_device{}()));
-    Scratch() { fs::create_directories(path); }
-    ~Scratch() { fs::remove_all(path); }
-};
 
 // A vector of wire bytes given in hex, first byte first, each MSB first.
 RLBitVec wire(const std::string& hex) {
@@ -46,8 +41,8 @@ SvfRecorderOptions forBridge(const std::string& name, const std::string& chain =
 // The statements after the header comments, from a status read (compare
 // the busy bit) and `waitUs` of waiting.
 std::string recordStatusRead(const SvfRecorderOptions& options, int waitUs = 0) {
-    Scratch folder;
-    const fs::path file = folder.path / "out.svf";
+    vorant::test::ScratchFolder folder;
+    const fs::path file = folder / "out.svf";
     {
         SvfRecorder recorder(file, options);
         RLBitVec opcode = wire("05"), tdi = wire("00"), tdo = wire("00"), mask = wire("01");
@@ -60,13 +55,11 @@ std::string recordStatusRead(const SvfRecorderOptions& options, int waitUs = 0) 
     }
     std::ifstream in(file);
     std::string text, line;
-    // The scans and waits; of the headers and trailers only those the
-    // chain needs (the set-up clears all four).
+    // The scans and waits; of the headers and trailers only those that
+    // shift bits (the set-up clears all four with a length of 0).
     while (std::getline(in, line)) {
         const std::string command = line.substr(0, line.find(' '));
-        if (command == "SIR" || command == "SDR" || command == "RUNTEST" ||
-            (line.find("TDI") != std::string::npos && line[1] != 'D' && line[0] != 'S') ||
-            (line.find("TDI") != std::string::npos && (command == "HDR" || command == "TDR")))
+        if (command == "SIR" || command == "SDR" || command == "RUNTEST" || line.find("TDI") != std::string::npos)
             text += line + "\n";
     }
     return text;

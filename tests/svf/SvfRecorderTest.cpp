@@ -6,6 +6,7 @@
 #include "ports/svf/SvfError.h"
 #include "ports/svf/SvfPlayer.h"
 #include "ports/svf/SvfRecorder.h"
+#include "tests/support/ScratchFolder.h"
 
 #include <gtest/gtest.h>
 
@@ -22,15 +23,7 @@ namespace {
 namespace fs = std::filesystem;
 using Bytes = std::vector<std::uint8_t>;
 
-// A fresh folder under the test's temporary folder, removed with its
-// contents.
-struct Scratch {
-    fs::path path = fs::path(::testing::TempDir()) / ("vorant-svf-" + std::to_string(std::random_device{}()));
-    Scratch() { fs::create_directories(path); }
-    ~Scratch() { fs::remove_all(path); }
-    fs::path operator/(const std::string& name) const { return path / name; }
-    std::size_t entries() const { return std::distance(fs::directory_iterator(path), {}); }
-};
+using Scratch = vorant::test::ScratchFolder;
 
 std::string readFile(const fs::path& file) {
     std::ostringstream text;
