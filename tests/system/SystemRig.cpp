@@ -16,15 +16,6 @@ std::vector<unsigned char> randomImage(std::size_t bytes, std::uint32_t seed) {
     return image;
 }
 
-std::uint32_t referenceCrc32(const std::vector<unsigned char>& bytes) {
-    std::uint32_t crc = 0xFFFFFFFFu;
-    for (unsigned char byte : bytes) {
-        crc ^= byte;
-        for (int k = 0; k < 8; ++k) crc = (crc >> 1) ^ ((crc & 1u) ? 0xEDB88320u : 0u);
-    }
-    return ~crc;
-}
-
 void loadShippedPartsOnce() {
     static std::once_flag once;
     std::call_once(once, [] {

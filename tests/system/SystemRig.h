@@ -20,9 +20,6 @@ namespace vorant::test {
 // Deterministic pseudo-random bytes.
 std::vector<unsigned char> randomImage(std::size_t bytes, std::uint32_t seed);
 
-// CRC-32 computed bit by bit, independent of every CRC in the project.
-std::uint32_t referenceCrc32(const std::vector<unsigned char>& bytes);
-
 struct SystemRig {
     explicit SystemRig(const std::string& part, sim::FaultPlan faults = {});
     ~SystemRig();
