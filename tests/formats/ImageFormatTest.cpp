@@ -23,7 +23,9 @@ TEST(ImageFormat, GivenFormatThenExtensionThenContentDecide) {
         std::optional<ImageFormat> given;
         std::optional<ImageFormat> expected;  // nothing: refused, asking for --format
     } cases[] = {
-        {"a.hex", hex, {}, ImageFormat::IntelHex},
+        {"a.HEX", hex, {}, ImageFormat::IntelHex},  // extensions in any letter case
+        {"b.Mcs", hex, {}, ImageFormat::IntelHex},
+        {"c.bin", hex, {}, ImageFormat::Binary},
         {"a.S37", srec, {}, ImageFormat::SRecord},
         {"a.img", hex, {}, ImageFormat::Binary},  // a known binary extension is final
         {"firmware", hex, {}, ImageFormat::IntelHex},
