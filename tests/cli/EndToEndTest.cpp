@@ -9,11 +9,6 @@
 namespace vorant::cli::test {
 namespace {
 
-// What a readback of a 2 MiB flash holds after `data` went in at `offset`.
-std::string flashWith(const std::string& data, std::size_t offset = 0) {
-    return std::string(kSimBytes, '\xff').replace(offset, data.size(), data);
-}
-
 struct AutoCase { const char* chip, *operation; int status; const char* text, *answer; };
 class AutoPart : public ToolTest, public ::testing::WithParamInterface<AutoCase> {};
 
@@ -28,7 +23,6 @@ INSTANTIATE_TEST_SUITE_P(ShippedParts, AutoPart, ::testing::Values(
     AutoCase{"W25Q16JV", "idcode", 0, "Identified W25Q16JV by its JEDEC ID EF4015.", "IDCODE is 'EF4015'"},
     // A part that identifies itself with RES: its device reads the signature.
     AutoCase{"M25P16", "signature", 0, "Identified M25P16 by its JEDEC ID 202015.", "IDCODE is '14'"},
-    AutoCase{"MX25L1606E", "idcode", 0, "Identified MX25L1606E by its JEDEC ID C22015.", "IDCODE is 'C22015'"},
     // Two generations answer C22016; SFDP tells them apart: the newer one
     // publishes a table, the older one none.
     AutoCase{"MX25L3233F", "idcode", 0, "Identified MX25L3233F by its JEDEC ID C22016 and its SFDP table",
@@ -41,40 +35,13 @@ INSTANTIATE_TEST_SUITE_P(ShippedParts, AutoPart, ::testing::Values(
              "Identified W25Q128JV by its JEDEC ID EF4018 and its limits: W25Q128FV, W25Q128JV differ only in their "
              "times",
              "IDCODE is 'EF4018'"},
-    AutoCase{"S25FL064L", "idcode", 0, "Identified S25FL064L by its JEDEC ID 016017.", "IDCODE is '016017'"},
     // Two parts answer 20BA18: the tool names both and wants --part.
     AutoCase{"N25Q128A", "idcode", 2, "(MT25QL128ABA, N25Q128A); choose one with --part NAME", "20BA18"}));
 
-class ProgramAndReadBack : public ToolTest, public ::testing::WithParamInterface<std::size_t> {};
-
-TEST_P(ProgramAndReadBack, GivesAFlashSizedFileOfTheImageThenErasedBytes) {
-    const std::size_t offset = GetParam();
-    const std::string data = randomBytes(70001, 11), image = offset ? "image.mcs" : "image.bin";
-    write(offset ? "data.bin" : image, data);
-    if (offset) {
-        if (std::system("command -v srec_cat >/dev/null") != 0) GTEST_SKIP() << "srec_cat is not installed";
-        const std::string make = "cd '" + dir.string() + "' && srec_cat data.bin -binary -offset " +
-                                 std::to_string(offset) + " -o image.mcs -intel";
-        ASSERT_EQ(std::system(make.c_str()), 0);
-    }
-    EXPECT_TRUE(has(ok(kSim + Args{"program", image, "-e", "-v"}).out, "Verification completed.")) << image;
-    ok(kSim + Args{"readback", "-f", "out.bin"});
-    EXPECT_TRUE(read("out.bin") == flashWith(data, offset)) << image;
-}
-
-INSTANTIATE_TEST_SUITE_P(BinAndMcs, ProgramAndReadBack, ::testing::Values(0, 0x1234));
-
-TEST_F(ToolTest, RecordedProgramPlaysOnAFreshFlashAndAFailedRecordingLeavesNoFile) {
-    const std::string image = randomBytes(70001, 15);  // some 600 KiB of SVF
+TEST_F(ToolTest, RecordedProgramPlaysOnAFreshFlash) {
+    const std::string image = randomBytes(70001, 15);
     write("image.bin", image);
-    const Args record{"--part", "W25Q16JV", "--port", "svf:job.svf", "program", "image.bin", "-e", "-v"};
-    // Writes past 64 KiB fail, as on a full disk.
-    const Result full = run(record, 64 * 1024);
-    EXPECT_EQ(full.status, 1) << full.text();
-    EXPECT_TRUE(has(full.err, "ERROR: job.svf could not be written (is the disk full?)\n")) << full.text();
-    EXPECT_EQ(files(), Args{"image.bin"});
-
-    ok(record);
+    ok({"--part", "W25Q16JV", "--port", "svf:job.svf", "program", "image.bin", "-e", "-v"});
     const Args played{"--part", "W25Q16JV", "--port", "sim:played.bin"};
     EXPECT_TRUE(has(ok(played + Args{"play", "job.svf"}).out, ", no mismatches."));
     ok(played + Args{"readback", "-f", "out.bin"});
@@ -90,23 +57,14 @@ TEST_F(ToolTest, RunsGiveTheirExitStatusAndAFileFlashKeepsItsContents) {
         {{"--part", "W25Q16JV", "verify", "image.bin"}, 1, "Failed at address, 0"},  // a fresh flash
         {kSim + Args{"erase"}, 0, "'0': Erasing Device."},
         {kSim + Args{"blankcheck"}, 0, "'0': Part is blank."},
-        // Quad Enable where the part keeps it in register 2 bit 1 ...
-        {{"--part", "W25Q32JV", "qe", "set"}, 0, "vorant-spi: qe succeeded"},
-        {{"--part", "W25Q32JV", "erase", "-qebit"}, 0, "vorant-spi: erase succeeded"},
-        // ... and elsewhere x4 data are programmed x1.
+        // Where Quad Enable is not register 2 bit 1, x4 data are programmed x1.
         {{"--part", "W25Q16JV", "--data-width", "4", "program", "image.bin"}, 0, "'0':Programming in x1 mode."},
-        {{"--part", "W25Q16JV", "frobnicate"}, 2, "unknown operation 'frobnicate'"},
         // A cancelled check gives no verdict; --quiet still says why a run failed.
         {kSim + Args{"--sim-fault", "cancel-after=2", "blankcheck"}, 1, "vorant-spi: cancelled by the user"},
         {kSim + Args{"--quiet", "verify", "image.bin"}, 1, "vorant-spi: verify failed"},
-        {kSim + Args{"--sim-fault", "cancel-after=3", "readback", "-f", "part.bin"}, 1,
-         "INFO: Nothing was written: part.bin is written only when the readback succeeds."},
         // The rate counts only the phase that moved the data.
         {kSim + Args{"program", "image.bin", "-e", "-v"}, 0, " simulated (erase 5.000 s, program "},
         {kSim + Args{"readback", "-f", "whole.bin"}, 0, " simulated (read 340.8 ms at 5.87 MiB/s)"},
-        // A recorded verify played on an erased flash: every compared read mismatches.
-        {{"--part", "W25Q16JV", "--port", "svf:verify.svf", "verify", "image.bin"}, 0, "recorded to verify.svf"},
-        {{"--part", "W25Q16JV", "play", "verify.svf"}, 1, "ERROR: verify.svf: line "},
     };
     for (const auto& step : runs) {
         const Result result = run(step.args);

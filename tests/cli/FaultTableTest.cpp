@@ -28,8 +28,6 @@ struct FaultCase {
     std::vector<std::string> causes;
 };
 
-std::string flashBytes(const std::string& file) { return file.substr(0, kSimBytes); }
-
 class FaultTable : public ToolTest {
 protected:
     void SetUp() override {
@@ -66,7 +64,7 @@ std::string faultOption(Fault fault, std::size_t page, const std::string& image,
 }
 
 TEST_F(FaultTable, EveryRunIsHonest) {
-    const std::string imageFlash = std::string(kSimBytes, '\xff').replace(0, image.size(), image);
+    const std::string imageFlash = flashWith(image);
     const OperationCase operations[] = {
         {"program -e -v", {"program", "image.bin", "-e", "-v"}, Start::Programmed, kImagePages},
         {"verify", {"verify", "image.bin"}, Start::Programmed, kImagePages},

@@ -9,22 +9,6 @@
 namespace vorant::cli::test {
 namespace {
 
-std::string flashBytes(const std::string& file) { return file.substr(0, kSimBytes); }
-
-// A chip slower than the part's first wait: every page is still busy at the
-// first poll, so polling decides when the next page may go.
-TEST_F(ToolTest, AFailedPollCountsAsBusy) {
-    write("slow.toml", userPart("SLOW16", "EF4015", {{"PROGRAM_WAITTIME", "100"}, {"SIM_PAGE_PROGRAM_US", "400"}}));
-    const std::string image = randomBytes(1024, 3);
-    write("image.bin", image);
-    const Args slow{"--parts", "slow.toml", "--part", "SLOW16", "--port", "sim:flash.sim"};
-    // Shift 8 is the first poll of page 1: after the ID read (1, 2), the
-    // unlock (3, 4, 5), the page's write enable (6) and program (7).
-    const Result result = run(slow + Args{"--sim-fault", "fail-shift=8", "--no-erase", "program", "image.bin"});
-    EXPECT_EQ(result.status, 0) << result.text();
-    EXPECT_TRUE(flashBytes(read("flash.sim")).substr(0, image.size()) == image) << "a page went to a busy chip";
-}
-
 // A lost cable ends the polling at once with the cable's reason, not after
 // the polling limit with a time-out.
 TEST_F(ToolTest, ALostCableStopsPollingAtOnce) {
@@ -60,15 +44,6 @@ TEST_F(ToolTest, AFailedEraseWritesNoPage) {
         EXPECT_TRUE(after == before || flashBytes(after) == std::string(kSimBytes, '\xff')) << fault;
     }
     unsetenv("QRX_VORANT_ENV_DONT_USE_POLLING");
-}
-
-TEST_F(ToolTest, AFailedIdReadShowsNoId) {
-    // The ID read is shifts 1 to 3; the third captures.
-    const Result result = run(Args{"--part", "W25Q16JV", "--sim-fault", "fail-shift=3", "idcode"});
-    EXPECT_EQ(result.status, 1);
-    EXPECT_TRUE(has(result.out, "IDCODE could not be read")) << result.text();
-    EXPECT_FALSE(has(result.out, "EF4015")) << "the expected ID shown as if read\n" << result.text();
-    EXPECT_TRUE(has(result.err, "injected fault")) << result.text();
 }
 
 // A chip that answers nothing is a failed run (status 1), named as such,

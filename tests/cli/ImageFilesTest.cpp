@@ -2,21 +2,10 @@
 // read as what they are, a binary lands at --offset, --format wins, a
 // readback writes S-records, and misuse is refused before any scan.
 #include "tests/cli/ToolTestFixture.h"
-
-#include <cstdio>
-#include <cstdlib>
-#include <vector>
+#include "tests/support/ReferenceCrc32.h"
 
 namespace vorant::cli::test {
 namespace {
-
-std::string flashWith(const std::string& data, std::size_t offset = 0) {
-    return std::string(kSimBytes, '\xff').replace(offset, data.size(), data);
-}
-
-bool srecCat(const std::string& arguments) {
-    return std::system(("srec_cat " + arguments + " >/dev/null 2>&1").c_str()) == 0;
-}
 
 TEST_F(ToolTest, EveryImageFormatProgramsWhereItsAddressesSay) {
     if (!srecCat("-VERSion")) GTEST_SKIP() << "srec_cat is not on PATH";
@@ -94,58 +83,26 @@ TEST_F(ToolTest, ProgramKeepsWhatTheImageDoesNotCover) {
     EXPECT_TRUE(has(ok(kSim + Args{"--offset", "0x10000", "program", "app.bin"}).out, "0 blocks erased"));
 }
 
-// CRC-32 (the zlib one) a bit at a time, apart from every CRC of the tool.
-std::uint32_t crc32Of(const std::string& bytes) {
-    std::uint32_t crc = 0xFFFFFFFFu;
-    for (unsigned char byte : bytes) {
-        crc ^= byte;
-        for (int bit = 0; bit < 8; ++bit) crc = (crc >> 1) ^ (0xEDB88320u & (0u - (crc & 1u)));
-    }
-    return ~crc;
-}
-
-std::string hex32(std::uint32_t value) {
-    char text[16];
-    std::snprintf(text, sizeof text, "0x%08X", value);
-    return text;
-}
-
 // checksum sums what the image holds, in address order, so the image alone
 // gives the same CRC; --whole-span sums every byte from address 0.
 TEST_F(ToolTest, ChecksumIsTheCrcOfTheImagesBytes) {
+    if (!srecCat("-VERSion")) GTEST_SKIP() << "srec_cat is not on PATH";
     const std::string low = randomBytes(300, 61), high = randomBytes(200, 62);
     write("low.bin", low);
     write("high.bin", high);
     ok(kSim + Args{"--offset", "0x100", "program", "low.bin"});
     ok(kSim + Args{"--offset", "0x9000", "program", "high.bin"});
-    // The two as one S-record file.
-    std::string srec;
-    auto record = [&](std::uint32_t address, const std::string& data) {
-        std::vector<unsigned char> bytes{static_cast<unsigned char>(data.size() + 5), static_cast<unsigned char>(address >> 24),
-                                         static_cast<unsigned char>(address >> 16), static_cast<unsigned char>(address >> 8),
-                                         static_cast<unsigned char>(address)};
-        bytes.insert(bytes.end(), data.begin(), data.end());
-        unsigned sum = 0;
-        char text[8];
-        srec += "S3";
-        for (unsigned char b : bytes) {
-            std::snprintf(text, sizeof text, "%02X", b);
-            srec += text;
-            sum += b;
-        }
-        std::snprintf(text, sizeof text, "%02X\n", 0xFFu - (sum & 0xFFu));
-        srec += text;
-    };
-    for (std::size_t at = 0; at < low.size(); at += 32) record(0x100 + static_cast<std::uint32_t>(at), low.substr(at, 32));
-    for (std::size_t at = 0; at < high.size(); at += 32) record(0x9000 + static_cast<std::uint32_t>(at), high.substr(at, 32));
-    write("both.srec", srec + "S70500000000FA\n");
-
+    ASSERT_TRUE(srecCat("'" + dir.string() + "/low.bin' -binary -offset 0x100 '" + dir.string() +
+                        "/high.bin' -binary -offset 0x9000 -o '" + dir.string() + "/both.srec' -motorola"));
+    const std::string both = low + high;
     const Result ranges = ok(kSim + Args{"checksum", "both.srec"});
-    EXPECT_TRUE(has(ranges.out, "of the device contents:    " + hex32(crc32Of(low + high)))) << ranges.text();
+    EXPECT_TRUE(has(ranges.out, "of the device contents:    " + vorant::test::referenceCrc32Text(both.data(), both.size())))
+        << ranges.text();
     std::string span(0x9000 + high.size(), '\xff');
     span.replace(0x100, low.size(), low).replace(0x9000, high.size(), high);
     const Result whole = ok(kSim + Args{"--whole-span", "checksum", "both.srec"});
-    EXPECT_TRUE(has(whole.out, "of the device contents:    " + hex32(crc32Of(span)))) << whole.text();
+    EXPECT_TRUE(has(whole.out, "of the device contents:    " + vorant::test::referenceCrc32Text(span.data(), span.size())))
+        << whole.text();
 }
 
 // A recording opens with the chip's ID check: played on another chip it

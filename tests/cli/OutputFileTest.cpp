@@ -9,9 +9,6 @@
 namespace vorant::cli::test {
 namespace {
 
-// What a readback of a 2 MiB flash holds after `data` went in at 0.
-std::string flashWith(const std::string& data) { return std::string(kSimBytes, '\xff').replace(0, data.size(), data); }
-
 class OutputFiles : public ToolTest {
 protected:
     // A flash file holding an image, and the readback it gives.
@@ -32,34 +29,6 @@ protected:
     }
 };
 
-// `cat FIFO > out` as a child process, ended by pid when still running.
-class FifoReader {
-public:
-    FifoReader(const fs::path& fifo, const fs::path& out) {
-        pid_ = fork();
-        if (pid_ != 0) return;
-        const int file = creat(out.c_str(), 0600);
-        if (file < 0 || dup2(file, 1) < 0) _exit(126);
-        execlp("cat", "cat", fifo.c_str(), static_cast<char*>(nullptr));
-        _exit(127);
-    }
-    ~FifoReader() {
-        if (pid_ <= 0) return;
-        kill(pid_, SIGKILL);
-        waitpid(pid_, nullptr, 0);
-    }
-    // Whether cat ended with status 0 within the limit.
-    bool finished(std::chrono::seconds limit) {
-        int raw = 0;
-        const bool ended = Child::until([&] { return waitpid(pid_, &raw, WNOHANG) == pid_; }, limit);
-        if (ended) pid_ = 0;
-        return ended && WIFEXITED(raw) && WEXITSTATUS(raw) == 0;
-    }
-
-private:
-    pid_t pid_ = -1;
-};
-
 TEST_F(OutputFiles, ReadbackThroughALinkReplacesTheFileItPointsToAndKeepsTheLink) {
     const std::string flash = programmedFlash();
     fs::create_directory(dir / "keep");
@@ -77,9 +46,9 @@ TEST_F(OutputFiles, ReadbackThroughALinkReplacesTheFileItPointsToAndKeepsTheLink
 TEST_F(OutputFiles, ReadbackToAFifoStreamsToItsReaderAndLeavesAFifo) {
     const std::string flash = programmedFlash();
     ASSERT_EQ(mkfifo((dir / "pipe").c_str(), 0600), 0);
-    FifoReader cat(dir / "pipe", root / "from-fifo");
+    Child cat("cat", {"pipe"}, dir, root / "from-fifo", root / "cat.err");
     ok(kSim + Args{"readback", "-f", "pipe"});
-    ASSERT_TRUE(cat.finished(std::chrono::seconds(30)));
+    ASSERT_EQ(cat.finish(std::chrono::seconds(30)).status, 0);
     EXPECT_TRUE(slurp(root / "from-fifo") == flash);
     EXPECT_TRUE(fs::is_fifo(dir / "pipe"));
 }
@@ -134,7 +103,9 @@ TEST_F(OutputFiles, RecordingThroughALinkReplacesItsTargetOnlyWhenItSucceeds) {
         return Args{"--part", "W25Q16JV", "--port", std::string("svf:") + file, "program", "image.bin", "-e"};
     };
     // Writes past 64 KiB fail, as on a full disk.
-    EXPECT_EQ(run(record("job.svf"), 64 * 1024).status, 1);
+    const Result full = run(record("job.svf"), 64 * 1024);
+    EXPECT_EQ(full.status, 1) << full.text();
+    EXPECT_TRUE(has(full.err, "ERROR: job.svf could not be written (is the disk full?)\n")) << full.text();
     EXPECT_EQ(read("jobs/real.svf"), "// an older recording\n");
     ok(record("job.svf"));
     ok(record("plain.svf"));

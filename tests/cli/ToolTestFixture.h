@@ -55,34 +55,43 @@ struct Result {
     }
 };
 
-// The tool running in `dir`; its output goes to files in `logDir`, or its
-// standard output to `stdoutFd` when one is given. A file size limit makes
-// every write past it fail, as on a full disk.
+// The folder of the built programs: set by ctest, else beside this test program.
+inline fs::path binDir() {
+    const char* bin = std::getenv("VORANT_BIN_DIR");
+    return bin ? fs::path(bin) : fs::read_symlink("/proc/self/exe").parent_path();
+}
+
+// A program running in `dir`, its standard output and error in files (one
+// file when both paths are the same), or its standard output on `stdoutFd`
+// when one is given; ended by pid. A file size limit makes every write past
+// it fail, as on a full disk.
 class Child {
 public:
-    Child(Args args, const fs::path& dir, const fs::path& logDir, rlim_t fileLimit = RLIM_INFINITY,
-          int stdoutFd = -1)
-        : out_(logDir / "out"), err_(logDir / "err") {
-        const char* bin = std::getenv("VORANT_BIN_DIR");  // set by ctest; else beside this test program
-        const fs::path binDir = bin ? fs::path(bin) : fs::read_symlink("/proc/self/exe").parent_path();
-        args.insert(args.begin(), (binDir / "vorant-spi").string());
+    Child(const std::string& program, Args args, const fs::path& dir, const fs::path& out, const fs::path& err,
+          rlim_t fileLimit = RLIM_INFINITY, int stdoutFd = -1)
+        : out_(out), err_(err) {
+        args.insert(args.begin(), program);
         std::vector<char*> argv;
         for (std::string& arg : args) argv.push_back(arg.data());
         argv.push_back(nullptr);
         pid_ = fork();
         if (pid_ != 0) return;
-        const int in = open("/dev/null", O_RDONLY), err = creat(err_.c_str(), 0600);
-        const int out = stdoutFd >= 0 ? stdoutFd : creat(out_.c_str(), 0600);
+        const int in = open("/dev/null", O_RDONLY), errFd = creat(err_.c_str(), 0600);
+        const int outFd = stdoutFd >= 0 ? stdoutFd : out_ == err_ ? errFd : creat(out_.c_str(), 0600);
         const rlimit limit{fileLimit, fileLimit};
-        if (in < 0 || out < 0 || err < 0 || dup2(in, 0) < 0 || dup2(out, 1) < 0 || dup2(err, 2) < 0 ||
+        if (in < 0 || outFd < 0 || errFd < 0 || dup2(in, 0) < 0 || dup2(outFd, 1) < 0 || dup2(errFd, 2) < 0 ||
             chdir(dir.c_str()) != 0 || setrlimit(RLIMIT_FSIZE, &limit) != 0)
             _exit(126);
         std::signal(SIGINT, SIG_DFL);
         std::signal(SIGPIPE, SIG_DFL);  // as a shell starts it: the tool must ignore SIGPIPE itself
         std::signal(SIGXFSZ, SIG_IGN);
-        execv(argv[0], argv.data());
+        execvp(argv[0], argv.data());
         _exit(127);
     }
+    // vorant-spi, its output in `logDir`.
+    Child(Args args, const fs::path& dir, const fs::path& logDir, rlim_t fileLimit = RLIM_INFINITY, int stdoutFd = -1)
+        : Child((binDir() / "vorant-spi").string(), std::move(args), dir, logDir / "out", logDir / "err", fileLimit,
+                stdoutFd) {}
     ~Child() {
         if (pid_ <= 0) return;
         kill(pid_, SIGKILL);
@@ -100,7 +109,13 @@ public:
         if (pid_ > 0 && waitpid(pid_, &raw_, WNOHANG) == pid_) pid_ = 0;
         return pid_ <= 0;
     }
+    bool running() { return !ended(); }
     void signal(int number) { if (pid_ > 0) kill(pid_, number); }
+    // SIGTERM, then SIGKILL when it has not ended within two seconds.
+    void stop() {
+        signal(SIGTERM);
+        if (!until([this] { return ended(); }, std::chrono::seconds(2))) signal(SIGKILL);
+    }
     // Waits for the end; a child still running after `limit` is killed.
     Result finish(std::chrono::seconds limit = std::chrono::seconds(60)) {
         Result result;
@@ -111,7 +126,8 @@ public:
             result.err = "killed at the time limit\n";
         } else if (WIFEXITED(raw_)) result.status = WEXITSTATUS(raw_);
         else result.signal = WTERMSIG(raw_);
-        result.out = slurp(out_), result.err += slurp(err_);
+        result.out = slurp(out_);
+        if (err_ != out_) result.err += slurp(err_);
         return result;
     }
 
@@ -150,6 +166,15 @@ protected:
 
 inline const Args kSim{"--part", "W25Q16JV", "--port", "sim:flash.bin"};
 inline constexpr std::size_t kSimBytes = 2 * 1024 * 1024;
+// What a readback of the 2 MiB flash holds after `data` went in at `offset`.
+inline std::string flashWith(const std::string& data, std::size_t offset = 0) {
+    return std::string(kSimBytes, '\xff').replace(offset, data.size(), data);
+}
+// The flash bytes of a flash file, without its status trailer.
+inline std::string flashBytes(const std::string& file) { return file.substr(0, kSimBytes); }
+inline bool srecCat(const std::string& arguments) {
+    return std::system(("srec_cat " + arguments + " >/dev/null 2>&1").c_str()) == 0;
+}
 
 // A part a user adds with --parts: the shipped Winbond family with 2 MiB
 // and the ID `id`; `keys` add or replace keys (TOML values; "" drops one).

@@ -3,6 +3,7 @@
 // contents, and flash bytes handed to a writer the way a readback does.
 #include "formats/ConfigDataFiles.h"
 #include "formats/FormatError.h"
+#include "tests/support/ScratchFolder.h"
 
 #include <algorithm>
 #include <filesystem>
@@ -17,17 +18,7 @@ namespace vorant::formats::testing {
 using Bytes = std::vector<unsigned char>;
 namespace fs = std::filesystem;
 
-// A fresh temporary directory, removed with everything in it.
-struct ScratchDirectory {
-    fs::path path;
-    ScratchDirectory() {
-        std::random_device random;
-        while (!fs::create_directory(path = fs::temp_directory_path() / ("vorant-formats-" + std::to_string(random())))) {}
-    }
-    ~ScratchDirectory() { std::error_code ignored; fs::remove_all(path, ignored); }
-    std::string file(const std::string& name) const { return (path / name).string(); }
-    long entries() const { return std::distance(fs::directory_iterator(path), fs::directory_iterator()); }
-};
+using ScratchDirectory = vorant::test::ScratchFolder;
 
 template <class Content> void writeFile(const std::string& path, const Content& content) {
     std::ofstream(path, std::ios::binary).write(reinterpret_cast<const char*>(content.data()), content.size());

@@ -42,13 +42,13 @@ TEST(Writers, CapturedBytesAreWrittenBitReversedIn16Or32ByteRecordsWithAn04Recor
 TEST(Writers, UnwritableTargetIsRefusedNamingItAndNothingIsCreated) {
     registerStandardFormats();
     ScratchDirectory dir;
-    fs::create_directory(dir.path / "taken.mcs");
+    fs::create_directory(dir.path() / "taken.mcs");
     for (const auto& [name, reason] : {std::pair{"no/such/dir/flash.mcs", "does not exist"}, {"taken.mcs", "is a directory"}}) {
         const std::string path = dir.file(name), message = formatErrorOf([&] { openConfigDataWriter(path); });
         EXPECT_TRUE(message.rfind(path + ": ", 0) == 0 && message.find(reason) != std::string::npos) << message;
         EXPECT_EQ(std::unique_ptr<ConfigDataWriter>(ConfigDataWriter::CreateWriter(path.c_str(), "part", nullptr)), nullptr);
     }
-    EXPECT_TRUE(dir.entries() == 1 && fs::is_empty(dir.path / "taken.mcs"));
+    EXPECT_TRUE(dir.entries() == 1 && fs::is_empty(dir.path() / "taken.mcs"));
 }
 
 TEST(Writers, AbandonedOrDiscardedWriteLeavesTheTargetAndAPublishedReadbackReadsBackAsTheFlash) {
@@ -78,25 +78,35 @@ TEST(Writers, AbandonedOrDiscardedWriteLeavesTheTargetAndAPublishedReadbackReads
 
 static bool srecCat(const std::string& arguments) { return std::system(("srec_cat " + arguments + " >/dev/null 2>&1").c_str()) == 0; }
 
-TEST(SrecCat, ItsFilesReadAsItConvertsThemAndOursConvertBackToTheData) {
+// srec_cat's S-records (its default mixes S1, S2 and S3 by address) and HEX
+// read as it converts them, our image starting at 0 with 0xFF below the
+// data; our files convert back to the flash.
+TEST(SrecCat, ItsFilesReadAsItConvertsThemAndOursConvertBackToTheFlash) {
     if (!srecCat("-VERSion")) GTEST_SKIP() << "srec_cat is not on PATH";
     ScratchDirectory dir;
     const std::string in = "'" + dir.file("in.bin") + "'", back = "'" + dir.file("back.bin") + "'";
-    // With an address offset; our image starts at address 0 with 0xFF below the first record.
-    for (const auto& [name, offset, size, options] : {std::tuple<const char*, int, int, const char*>{"a.mcs", 0x1000, 5001, "-Output_Block_Size 16"},
-             {"b.mcs", 0xFFF0, 0x20003, ""}, {"c.hex", 0x1F000, 70000, "-address-length=3"}}) {
-        const std::string hex = "'" + dir.file(name) + "'";
-        writeFile(dir.file("in.bin"), randomBytes(size, size));
-        ASSERT_TRUE(srecCat(in + " -binary -offset " + std::to_string(offset) + " -o " + hex + " -intel " + options));
-        ASSERT_TRUE(srecCat(hex + " -intel -fill 0xFF 0 " + std::to_string(offset + size) + " -o " + back + " -binary"));
-        EXPECT_EQ(loadFlashImage(dir.file(name)).denseBytes(), readFile(dir.file("back.bin"))) << name;
+    const std::tuple<const char*, int, int, const char*> theirs[] = {
+        {"a.srec", 0, 5001, "-motorola"}, {"b.s28", 0xFFF0, 0x20003, "-motorola"}, {"c.mot", 0x1FFFF00, 700, "-motorola"},
+        {"a.mcs", 0x1000, 5001, "-intel -Output_Block_Size 16"}, {"b.mcs", 0xFFF0, 0x20003, "-intel"},
+        {"c.hex", 0x1F000, 70000, "-intel -address-length=3"}};
+    for (const auto& [name, offset, size, format] : theirs) {
+        const Bytes data = randomBytes(static_cast<std::size_t>(size), static_cast<unsigned>(size));
+        writeFile(dir.file("in.bin"), data);
+        ASSERT_TRUE(srecCat(in + " -binary -offset " + std::to_string(offset) + " -o '" + dir.file(name) + "' " + format));
+        Bytes expected(static_cast<std::size_t>(offset), 0xFF);
+        expected.insert(expected.end(), data.begin(), data.end());
+        EXPECT_TRUE(loadFlashImage(dir.file(name)).denseBytes() == expected) << name;
     }
     const Bytes flash = randomBytes(0x20000 + 77, 99);
-    for (const auto& [name, recordBytes, offset] : {std::tuple{"ours.mcs", 16, 0}, {"ours.hex", 32, 0x1F000}}) {
+    const std::tuple<const char*, int, int, const char*> ours[] = {
+        {"ours.srec", 16, 0, "-motorola"}, {"ours.s37", 16, 0x1F000, "-motorola"},
+        {"ours.mcs", 16, 0, "-intel"}, {"ours.hex", 32, 0x1F000, "-intel"}};
+    for (const auto& [name, recordBytes, offset, format] : ours) {
         auto writer = openConfigDataWriter(dir.file(name), recordBytes);
         ASSERT_TRUE(writePages(*writer, flash, offset, 256) && writer->endWrite());
         ASSERT_TRUE(PendingOutputs::commitAll().empty());
-        ASSERT_TRUE(srecCat("'" + dir.file(name) + "' -intel -offset -" + std::to_string(offset) + " -o " + back + " -binary"));
+        ASSERT_TRUE(srecCat("'" + dir.file(name) + "' " + format + " -offset -" + std::to_string(offset) + " -o " + back +
+                            " -binary"));
         EXPECT_EQ(readFile(dir.file("back.bin")), flash) << name;
     }
 }

@@ -16,14 +16,6 @@ std::string bits(const RLBitVec& v) {
     return s;
 }
 
-TEST(BitVector, TestBitCountsFromTheEnd) {
-    RLBitVec v(8, false);
-    v.setBit(7, true);  // the last bit captured: a status register's bit 0
-    EXPECT_TRUE(v.testBit(0));
-    EXPECT_FALSE(v.testBit(1));
-    EXPECT_EQ(v.data()[0], 0x80);
-}
-
 TEST(BitVector, WorkedPageProgramExampleFromTheWireContract) {
     // Page program of A5 01 at 0x000100: opcode 02 at bit 0, 24-bit address
     // at bit 8, data at bit 32.
@@ -76,16 +68,6 @@ TEST(BitVector, UniformValueAnswersBlankOnlyForAllOnes) {
     EXPECT_EQ(RLBitVec(64, false).uniformValue(), 0u);
 }
 
-TEST(Conversions, IdCodeRoundTripsThroughTheCapturedBits) {
-    auto expected = Hex2Bit::convertHexString2BitVec("EF4018", 24, true, false, false);
-    EXPECT_EQ(bits(*expected), "11101111" "01000000" "00011000");
-    EXPECT_STREQ(Hex2Bit::convertBinData2HexString(expected->data(), 24, true, false), "EF4018");
-    auto lower = Hex2Bit::convertHexString2BitVec("ef4018", 24, true, false, false);
-    EXPECT_TRUE(lower->equals(*expected));
-    auto signature = Hex2Bit::convertHexString2BitVec("17", 8, true, false, false);
-    EXPECT_STREQ(Hex2Bit::convertBinData2HexString(signature->data(), 8, true, false), "17");
-}
-
 TEST(Conversions, HexTextsAreRightAlignedInTheirWidth) {
     EXPECT_THROW(Hex2Bit::convertHexString2BitVec("EF40G8", 24, true, false, false), VorantException);
     // Wider than asked: the low-order (last) digits stay.
@@ -102,15 +84,6 @@ TEST(Conversions, BinaryStringMapsCharacterJToBitJ) {
     EXPECT_EQ(v->length(), 8u);
     EXPECT_EQ(v->data()[0], 0xF9) << "opcode 9F sent MSB first is the storage byte reversed";
     EXPECT_THROW(Hex2Bit::convertBinString2BitVec("101", 8, true), VorantException);
-}
-
-TEST(Conversions, IntegerConversionKeepsCapturedOrder) {
-    RLBitVec mask(8, true);
-    Hex2Bit::convertInt2BitVec(0xBF, 8, &mask, false);
-    EXPECT_EQ(mask.data()[0], 0xBF);
-    RLBitVec wide(16, true);
-    Hex2Bit::convertInt2BitVec(0x01, 16, &wide, false);
-    EXPECT_EQ(bits(wide), "1000000000000000");
 }
 
 }  // namespace

@@ -3,8 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <cstdlib>
-
 namespace {
 
 TEST(TextServices, ICompareIgnoresCaseOnly) {
@@ -29,13 +27,6 @@ TEST(TextServices, IMatchIsACaseInsensitiveWildcardMatch) {
     for (const auto& c : cases)
         EXPECT_EQ(UT_STR::IMatch(c.text, c.pattern) != 0, c.match)
             << (c.text ? c.text : "(null)") << " ~ " << c.pattern;
-}
-
-TEST(TextServices, GetEnvAnswersNullForUndefinedVariables) {
-    ::setenv("VORANT_TEST_VARIABLE", "", 1);
-    ASSERT_NE(Port_Env::GetEnv("VORANT_TEST_VARIABLE"), nullptr) << "defined but empty still counts";
-    ::unsetenv("VORANT_TEST_VARIABLE");
-    EXPECT_EQ(Port_Env::GetEnv("VORANT_TEST_VARIABLE"), nullptr);
 }
 
 }  // namespace

@@ -12,63 +12,23 @@
 namespace vorant::openocd::test {
 
 using cli::test::Args;
+using cli::test::binDir;
 using cli::test::operator+;
 using cli::test::Child;
 using cli::test::Result;
 using cli::test::has;
 namespace fs = std::filesystem;
 
-// A program started by path, its output in files; ended by pid.
-class Process {
-public:
-    Process(const std::string& program, Args args, const fs::path& dir, const fs::path& log) : log_(log) {
-        args.insert(args.begin(), program);
-        std::vector<char*> argv;
-        for (std::string& arg : args) argv.push_back(arg.data());
-        argv.push_back(nullptr);
-        pid_ = fork();
-        if (pid_ != 0) return;
-        const int in = open("/dev/null", O_RDONLY), out = creat(log.c_str(), 0600);
-        if (in < 0 || out < 0 || dup2(in, 0) < 0 || dup2(out, 1) < 0 || dup2(out, 2) < 0 || chdir(dir.c_str()) != 0)
-            _exit(126);
-        execvp(argv[0], argv.data());
-        _exit(127);
-    }
+// A program whose output and errors share one log file, stopped (SIGTERM
+// first, so the board keeps its flash file) when it goes.
+struct Process : Child {
+    Process(const std::string& program, Args args, const fs::path& dir, const fs::path& log)
+        : Child(program, std::move(args), dir, log, log) {}
     ~Process() { stop(); }
-    std::string log() const { return cli::test::slurp(log_); }
-    bool running() {
-        if (pid_ > 0 && waitpid(pid_, &status_, WNOHANG) == pid_) pid_ = 0;
-        return pid_ > 0;
-    }
-    // SIGTERM, then SIGKILL when it has not ended within two seconds.
-    void stop() {
-        if (pid_ <= 0) return;
-        kill(pid_, SIGTERM);
-        if (!Child::until([this] { return !running(); }, std::chrono::seconds(2)) && pid_ > 0) {
-            kill(pid_, SIGKILL);
-            waitpid(pid_, nullptr, 0);
-        }
-        pid_ = 0;
-    }
-    void killNow() {
-        if (pid_ <= 0) return;
-        kill(pid_, SIGKILL);
-        waitpid(pid_, nullptr, 0);
-        pid_ = 0;
-    }
-
-private:
-    fs::path log_;
-    pid_t pid_ = -1;
-    int status_ = 0;
+    std::string log() const { return out(); }
 };
 
 inline bool openOcdInstalled() { return std::system("command -v openocd >/dev/null 2>&1") == 0; }
-
-inline fs::path binDir() {
-    const char* bin = std::getenv("VORANT_BIN_DIR");
-    return bin ? fs::path(bin) : fs::read_symlink("/proc/self/exe").parent_path();
-}
 
 inline fs::path quickParts() { return fs::path(VORANT_TEST_DATA_DIR) / "parts" / "quick.toml"; }
 
@@ -85,16 +45,26 @@ inline int freePort() {
     return ntohs(address.sin_port);
 }
 
-inline bool accepts(int port) {
+// A connection to a loopback port; -1 when nobody listens there.
+inline int connectLoopback(int port) {
     const int fd = socket(AF_INET, SOCK_STREAM, 0);
     sockaddr_in address{};
     address.sin_family = AF_INET;
     address.sin_port = htons(static_cast<std::uint16_t>(port));
     address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    const bool ok = connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) == 0;
+    if (connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) == 0) return fd;
     close(fd);
-    return ok;
+    return -1;
 }
+
+inline bool accepts(int port) {
+    const int fd = connectLoopback(port);
+    if (fd >= 0) close(fd);
+    return fd >= 0;
+}
+
+// The port in the board's first line, "listening on 127.0.0.1:PORT".
+inline int listeningPort(const std::string& log) { return std::stoi(log.substr(log.rfind(':', log.find('\n')) + 1)); }
 
 class OpenOcdRig : public cli::test::ToolTest {
 protected:
@@ -115,10 +85,8 @@ protected:
         ASSERT_TRUE(Child::until([this] { return board_->log().find('\n') != std::string::npos || !board_->running(); },
                                  std::chrono::seconds(10)))
             << "the board did not start";
-        const std::string log = board_->log();
-        const std::size_t colon = log.rfind(':', log.find('\n'));
-        ASSERT_EQ(log.rfind("listening on 127.0.0.1:", 0), 0u) << log;
-        boardPort_ = std::stoi(log.substr(colon + 1));
+        ASSERT_EQ(board_->log().rfind("listening on 127.0.0.1:", 0), 0u) << board_->log();
+        boardPort_ = listeningPort(board_->log());
     }
 
     // OpenOCD with remote_bitbang to the board, its Tcl server on a free

@@ -102,7 +102,7 @@ TEST_F(OpenOcdRig, NamesWhyTheCableFailed) {
     write("image.bin", randomBytes(kImageBytes, 10));
     Child program(viaOpenOcd({"program", "image.bin", "-e"}), dir, root);
     std::this_thread::sleep_for(std::chrono::milliseconds(600));
-    board_->killNow();
+    board_->signal(SIGKILL);
     const Result vanished = program.finish(std::chrono::seconds(60));
     EXPECT_EQ(vanished.status, 1) << vanished.text();
     EXPECT_FALSE(has(vanished.err, "succeeded")) << vanished.text();
@@ -120,27 +120,14 @@ TEST_F(OpenOcdRig, RefusesATapDeclaredWithAnotherIrLength) {
     EXPECT_EQ(files(), Args{"flash.bin"}) << "nothing but the board's flash file";
 }
 
-}  // namespace
-}  // namespace vorant::openocd::test
-
-namespace vorant::openocd::test {
-namespace {
-
 // The board refuses a stream that is not remote_bitbang: a message, the
 // connection closed, and the board still serving the next adapter. No
 // OpenOCD needed.
 class BoardServer : public cli::test::ToolTest {};
 
 std::string exchange(int port, const std::string& bytes) {
-    const int fd = socket(AF_INET, SOCK_STREAM, 0);
-    sockaddr_in address{};
-    address.sin_family = AF_INET;
-    address.sin_port = htons(static_cast<std::uint16_t>(port));
-    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    if (connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0) {
-        close(fd);
-        return "no connection";
-    }
+    const int fd = connectLoopback(port);
+    if (fd < 0) return "no connection";
     timeval limit{5, 0};
     setsockopt(fd, SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
     send(fd, bytes.data(), bytes.size(), MSG_NOSIGNAL);
@@ -154,8 +141,7 @@ std::string exchange(int port, const std::string& bytes) {
 TEST_F(BoardServer, RefusesMalformedInputAndServesTheNextAdapter) {
     Process board((binDir() / "vorant-board").string(), Args{"--part", "W25Q16JV"}, dir, root / "board.log");
     ASSERT_TRUE(Child::until([&] { return board.log().find('\n') != std::string::npos; }, std::chrono::seconds(10)));
-    const std::string log = board.log();
-    const int port = std::stoi(log.substr(log.rfind(':', log.find('\n')) + 1));
+    const int port = listeningPort(board.log());
 
     EXPECT_EQ(exchange(port, "0R4R\x01" "0R"), "11") << "the answers before the bad byte, then the end";
     ASSERT_TRUE(Child::until([&] { return board.log().find("unexpected byte 0x01") != std::string::npos; },

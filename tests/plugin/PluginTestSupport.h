@@ -9,6 +9,7 @@
 #include "host/UT_CMDARGS.h"
 #include "s/Type1SPIDevice.h"
 #include "tests/support/RecordingScanPort.h"
+#include "tests/support/ReferenceCrc32.h"
 #include "tests/support/TestParts.h"
 
 #include <gtest/gtest.h>
@@ -198,22 +199,15 @@ inline std::string expand(const std::string& pattern) {
     }
     return out;
 }
-// The checksum report of `data` against the flash: CRC-32 (zlib's, computed
-// here bit by bit) of the data and of as many flash bytes.
+// The checksum report of `data` against the flash: the reference CRC-32 of
+// the data and of as many flash bytes.
 inline Lines checksumLines(const Bytes& data, const Bytes& flash) {
-    const auto crc32 = [&data](const Bytes& bytes) {
-        std::uint32_t crc = ~0u;
-        for (std::size_t i = 0; i < data.size(); ++i)
-            for (unsigned k = 0, b = bytes[i]; k < 8; ++k, b >>= 1)
-                crc = (crc ^ b) & 1u ? (crc >> 1) ^ 0xEDB88320u : crc >> 1;
-        return static_cast<unsigned>(~crc);
-    };
-    char sums[2][96];
-    std::snprintf(sums[0], 96, "'0': Checksum (CRC-32) of the configuration data: 0x%08X\n", crc32(data));
-    std::snprintf(sums[1], 96, "'0': Checksum (CRC-32) of the device contents:    0x%08X\n", crc32(flash));
+    const std::string dataSum = referenceCrc32Text(data.data(), data.size());
+    const std::string flashSum = referenceCrc32Text(flash.data(), data.size());
     Lines out = {"All Checksum calculations are performed on the address range spanned by the configuration file.\n",
-                 sums[0], sums[1]};
-    if (crc32(data) == crc32(flash)) out.push_back("'0': Checksums match.\n");
+                 "'0': Checksum (CRC-32) of the configuration data: " + dataSum + "\n",
+                 "'0': Checksum (CRC-32) of the device contents:    " + flashSum + "\n"};
+    if (dataSum == flashSum) out.push_back("'0': Checksums match.\n");
     return out;
 }
 // A flash answering the status reads as `s` says (WIP in the last bit

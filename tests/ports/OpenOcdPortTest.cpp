@@ -118,27 +118,21 @@ TEST(OpenOcdPort, ALostConnectionIsALostCable) {
     EXPECT_NE(std::string(rig.scan().failureReason()).find("OpenOCD closed the connection"), std::string::npos);
 }
 
-TEST(OpenOcdPort, RefusesABridgeInstructionOfAnotherIrLength) {
-    try {
-        Rig rig(",irlen=8");
-        ADD_FAILURE() << "an 8-bit instruction on a 6-bit IR was accepted";
-    } catch (const PortError& error) {
-        EXPECT_EQ(error.kind(), PortError::Kind::Unavailable);
-        EXPECT_NE(std::string(error.what()).find("OpenOCD declares fpga.tap with a 6-bit IR, but the bridge's "
-                                                 "instruction has 8 bits"),
-                  std::string::npos)
-            << error.what();
-    }
-}
-
-TEST(OpenOcdPort, NamesTheTapsWhenTheOneAskedForIsMissing) {
-    try {
-        Rig rig(",tap=cpu.tap");
-        ADD_FAILURE() << "an unknown TAP was accepted";
-    } catch (const PortError& error) {
-        EXPECT_EQ(error.kind(), PortError::Kind::Unavailable);
-        EXPECT_NE(std::string(error.what()).find("OpenOCD has no TAP 'cpu.tap' (it has fpga.tap)"), std::string::npos)
-            << error.what();
+// A bridge instruction of another length than the TAP's IR, or a TAP that
+// is not there: the port is unavailable, and says what OpenOCD has.
+TEST(OpenOcdPort, RefusesATapItCannotDrive) {
+    const std::pair<const char*, const char*> cases[] = {
+        {",irlen=8", "OpenOCD declares fpga.tap with a 6-bit IR, but the bridge's instruction has 8 bits"},
+        {",tap=cpu.tap", "OpenOCD has no TAP 'cpu.tap' (it has fpga.tap)"},
+    };
+    for (const auto& [keys, message] : cases) {
+        try {
+            Rig rig(keys);
+            ADD_FAILURE() << keys << " was accepted";
+        } catch (const PortError& error) {
+            EXPECT_EQ(error.kind(), PortError::Kind::Unavailable);
+            EXPECT_NE(std::string(error.what()).find(message), std::string::npos) << error.what();
+        }
     }
 }
 

@@ -76,13 +76,6 @@ TEST(TransactionFramer, FramesEveryStageSequenceByTheRules) {
     }
 }
 
-TEST(TransactionFramer, NamesEachRefusal) {
-    EXPECT_EQ(describeFramingFault(FramingFault::NothingOpen, 3), "shift stage 3 without an open transaction");
-    EXPECT_EQ(describeFramingFault(FramingFault::UnknownStage, 7), "unknown shift stage 7");
-    EXPECT_EQ(describeFramingFault(FramingFault::NoTdi, 0), "shift without bits to drive");
-    EXPECT_EQ(describeFramingFault(FramingFault::None, 0), "");
-}
-
 // A sink that throws (a lost cable) must not be left counted open, or the
 // next wait would deselect a transaction the cable never saw.
 TEST(TransactionFramer, ASinkThatThrowsLeavesNothingOpen) {

@@ -3,8 +3,8 @@
 
 #include "ports/sim/FlashFile.h"
 #include "ports/sim/FlashFileError.h"
-#include "tests/sim/FileTestSupport.h"
 #include "tests/sim/SimTestSupport.h"
+#include "tests/support/ScratchFolder.h"
 #include "tests/support/TestParts.h"
 
 #include "host/VorantException.h"
@@ -21,6 +21,8 @@
 
 namespace vorant::sim::test {
 namespace {
+
+using vorant::test::ScratchFolder;
 
 // Plays a transcript on the chip at its 50 MHz clock; returns "" or the
 // first step whose answer differs. Steps are separated by '|': a
@@ -193,30 +195,6 @@ TEST(FlashFile, RefusesAFileOfAnotherSizeNamingWhy) {
         EXPECT_TRUE(std::string(std::istreambuf_iterator<char>(in), {}) == contents) << reason;
         EXPECT_EQ(folder.names(), std::vector<std::string>{"flash.bin"});
     }
-}
-
-// A new file appears whole or not at all: where writes stop part way (a
-// file size limit, as on a full disk) the creation fails naming how far it
-// got, and neither the file nor its temporary file is left behind. Runs in
-// a child so the limit binds nothing else.
-TEST(FlashFile, CreationThatRunsOutOfSpaceLeavesNoFile) {
-    ScratchFolder folder;
-    const std::string path = folder.file("flash.bin");
-    const std::string outcome = inLimitedChild(64 * 1024, [&]() -> std::string {
-        try {
-            FlashFile file(path, 128 * 1024);
-            return "created";
-        } catch (const FlashFileError& e) {
-            return std::string(e.kind() == FlashFileError::Kind::DiskFull ? "disk full: " : "other: ") + e.what();
-        }
-    });
-    EXPECT_EQ(outcome, "disk full: flash file '" + path +
-                           "' cannot be created: the file size limit is reached after 65536 of its 131088 bytes; "
-                           "no file was made");
-    EXPECT_TRUE(folder.names().empty());
-    FlashFile file(path, 128 * 1024);  // without the limit
-    EXPECT_EQ(std::filesystem::file_size(path), 128 * 1024 + FlashFile::kTrailerBytes);
-    EXPECT_EQ(folder.names(), std::vector<std::string>{"flash.bin"});
 }
 
 // The facts a chip takes from its part; the register-2 read opcode in

@@ -16,41 +16,6 @@ std::vector<unsigned char> randomImage(std::size_t bytes, std::uint32_t seed) {
     return image;
 }
 
-std::uint32_t referenceCrc32(const std::vector<unsigned char>& bytes) {
-    std::uint32_t crc = 0xFFFFFFFFu;
-    for (unsigned char byte : bytes) {
-        crc ^= byte;
-        for (int k = 0; k < 8; ++k) crc = (crc >> 1) ^ ((crc & 1u) ? 0xEDB88320u : 0u);
-    }
-    return ~crc;
-}
-
-std::uint8_t firstWireByte(const RLBitVec& vector) {
-    std::uint8_t value = 0;
-    for (std::size_t i = 0; i < 8 && i < vector.length(); ++i)
-        value = static_cast<std::uint8_t>(value | (((vector.data()[i / 8] >> (i % 8)) & 1u) << (7 - i)));
-    return value;
-}
-
-CountingPort::CountingPort(ScanPort& inner, std::uint8_t pageProgramOpcode, std::uint8_t writeDisableOpcode)
-    : inner_(inner), pageProgramOpcode_(pageProgramOpcode), writeDisableOpcode_(writeDisableOpcode) {}
-
-bool CountingPort::shift(int stage, RLBitVec* tdi, RLBitVec* tdiMask, RLBitVec* tdo, RLBitVec* tdoMask) {
-    if (stage == 0 && tdi && tdi->length() > 8 && firstWireByte(*tdi) == pageProgramOpcode_) ++pagesProgrammed;
-    return inner_.shift(stage, tdi, tdiMask, tdo, tdoMask);
-}
-
-bool CountingPort::shiftWrite(int stage, RLBitVec* tdi, int reserved) {
-    if (tdi) lastWriteOpcode = firstWireByte(*tdi);
-    (void)writeDisableOpcode_;
-    return inner_.shiftWrite(stage, tdi, reserved);
-}
-
-bool CountingPort::isCancelled(int level) {
-    const bool inner = inner_.isCancelled(level);
-    return inner || (cancelAfterPages >= 0 && pagesProgrammed >= cancelAfterPages);
-}
-
 void loadShippedPartsOnce() {
     static std::once_flag once;
     std::call_once(once, [] {

@@ -20,34 +20,6 @@ namespace vorant::test {
 // Deterministic pseudo-random bytes.
 std::vector<unsigned char> randomImage(std::size_t bytes, std::uint32_t seed);
 
-// CRC-32 computed bit by bit, independent of every CRC in the project.
-std::uint32_t referenceCrc32(const std::vector<unsigned char>& bytes);
-
-// Forwards every call to a port and counts page programs (stage-0 shifts
-// whose first byte is the page-program opcode) and write disables; can ask
-// the port to cancel after a number of pages.
-class CountingPort : public ScanPort {
-public:
-    CountingPort(ScanPort& inner, std::uint8_t pageProgramOpcode, std::uint8_t writeDisableOpcode);
-    bool outputMode() override { return inner_.outputMode(); }
-    void comment(const char* text) override { inner_.comment(text); }
-    bool shift(int stage, RLBitVec* tdi, RLBitVec* tdiMask, RLBitVec* tdo, RLBitVec* tdoMask) override;
-    bool shiftWrite(int stage, RLBitVec* tdi, int reserved) override;
-    bool wait(int time, bool microseconds) override { return inner_.wait(time, microseconds); }
-    bool isCancelled(int level) override;
-
-    int pagesProgrammed = 0;
-    int cancelAfterPages = -1;
-    std::uint8_t lastWriteOpcode = 0;  // first byte of the last shiftWrite
-
-private:
-    ScanPort& inner_;
-    std::uint8_t pageProgramOpcode_, writeDisableOpcode_;
-};
-
-// The first byte of a vector as it goes on the wire.
-std::uint8_t firstWireByte(const RLBitVec& vector);
-
 struct SystemRig {
     explicit SystemRig(const std::string& part, sim::FaultPlan faults = {});
     ~SystemRig();
