@@ -199,6 +199,11 @@ def sector_erase_estimate_us(size):
             262144: (520000, 6000000)}[size]
 
 
+# (typical, maximum) of a block erase whose SFDP table (before revision 1.5)
+# names the erase but not its time: placeholders with a generous maximum.
+BLOCK_ERASE_PLACEHOLDER_US = {32768: (120000, 2000000), 65536: (200000, 3000000)}
+
+
 def sfdp_erase_types(part):
     """Erase types of a part's real SFDP dump: [(bytes, opcode, typical us,
     maximum us)] in the table's order, times None where the table (before
@@ -270,24 +275,27 @@ def part_keys(row):
     add("SECTOR_SIZE", sector)
     # Each erase size the real SFDP table lists with its times; otherwise the
     # smallest erase with family estimates.
-    from_sfdp = {size: (op, typ, mx) for size, op, typ, mx in sfdp_erase_types(row["part"]) if typ is not None}
-    typ, mx = from_sfdp[sector][1:] if sector in from_sfdp else sector_erase_estimate_us(sector)
+    erase_types = {size: (op, typ, mx) for size, op, typ, mx in sfdp_erase_types(row["part"])}
+    timed = sector in erase_types and erase_types[sector][1] is not None
+    typ, mx = erase_types[sector][1:] if timed else sector_erase_estimate_us(sector)
     add("SECTORERASE_WAITTIME", typ)
     add("SECTORERASE_WAITTIME_INC", max(1, typ // 10))
     add("SECTORERASE_MAXWAITTIME", mx * 3 // 2)
     for size, prefix, simulated in ((32768, "BLOCKERASE32", "SIM_BLOCK32_ERASE_US"),
                                     (65536, "BLOCKERASE64", "SIM_BLOCK64_ERASE_US")):
-        if size == sector or size not in from_sfdp:
+        if size == sector or size not in erase_types:
             continue
-        op, typ, mx = from_sfdp[size]
+        op, typ, mx = erase_types[size]
+        if typ is None:
+            typ, mx = BLOCK_ERASE_PLACEHOLDER_US[size]
         add(prefix + "_INSTRUCTION", opcode_bits(pick(op)))
         add(prefix + "_SIZE", size)
         add(prefix + "_WAITTIME", typ)
         add(prefix + "_WAITTIME_INC", max(1, typ // 10))
         add(prefix + "_MAXWAITTIME", mx * 3 // 2)
         add(simulated, typ)
-    if sector in from_sfdp:
-        add("SIM_SECTOR_ERASE_US", from_sfdp[sector][1])
+    if timed:
+        add("SIM_SECTOR_ERASE_US", erase_types[sector][1])
     add("BULKERASE_INSTRUCTION", opcode_bits(row["be"]))
     has_dp = row["dp"] != "-"
     has_res = row["res"] != "-"
@@ -388,8 +396,10 @@ def render(file_stem, rows, skipped, tables):
     out.append("# step = (limit - first wait) / 100, status-write limit = tW max x 1.5,")
     out.append("# release wait = tRES1 x 1.5 rounded up. Erase sizes and times: a part with")
     out.append("# a real SFDP table (SFDP key) takes its erase types and typical and maximum")
-    out.append("# times from it; the others keep their smallest erase with family estimates")
-    out.append("# (typical 45 ms and maximum 400 ms for 4 KiB) as placeholders.")
+    out.append("# times from it (a table without times: its erase types, with placeholder")
+    out.append("# times of 120 ms / 2 s for 32 KiB and 200 ms / 3 s for 64 KiB); the others")
+    out.append("# keep their smallest erase with family estimates (typical 45 ms and")
+    out.append("# maximum 400 ms for 4 KiB) as placeholders.")
     if skipped:
         out.append("#")
         out.append("# Left out:")
