@@ -2,6 +2,7 @@
 
 #include "formats/AddressRanges.h"
 #include "formats/FormatError.h"
+#include "formats/RecordLines.h"
 #include "formats/HexText.h"
 #include "formats/InputFile.h"
 
@@ -35,12 +36,8 @@ public:
         : sourceName_(sourceName), maxImageBytes_(maxImageBytes) {}
 
     FlashImage parse(std::istream& in) {
-        std::string line;
-        while (std::getline(in, line)) {
-            ++lineNumber_;
-            parseLine(line);
-        }
-        if (in.bad()) throw FormatError(sourceName_ + ": read error after line " + std::to_string(lineNumber_));
+        forEachRecordLine(in, sourceName_, lineNumber_,
+                          [this](const std::string& line, std::size_t length) { parseLine(line, length); });
         if (!sawEndOfFile_) {
             fail(lineNumber_, "the file ends without an end-of-file record (type 01)");
         }
@@ -52,12 +49,7 @@ private:
         throw FormatError(sourceName_ + ":" + std::to_string(line) + ": " + reason);
     }
 
-    void parseLine(std::string& line) {
-        std::size_t length = line.size();
-        while (length > 0 && (line[length - 1] == '\r' || line[length - 1] == ' ' || line[length - 1] == '\t')) {
-            --length;
-        }
-        if (length == 0) return;
+    void parseLine(const std::string& line, std::size_t length) {
         if (sawEndOfFile_) fail(lineNumber_, "record after the end-of-file record");
         if (line[0] != ':') {
             fail(lineNumber_, "a record starts with ':', this line starts with " + describeCharacter(line[0]));

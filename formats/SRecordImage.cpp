@@ -2,6 +2,7 @@
 
 #include "formats/AddressRanges.h"
 #include "formats/FormatError.h"
+#include "formats/RecordLines.h"
 #include "formats/HexText.h"
 #include "formats/InputFile.h"
 
@@ -20,12 +21,8 @@ public:
         : sourceName_(sourceName), maxImageBytes_(maxImageBytes) {}
 
     FlashImage parse(std::istream& in) {
-        std::string line;
-        while (std::getline(in, line)) {
-            ++lineNumber_;
-            parseLine(line);
-        }
-        if (in.bad()) throw FormatError(sourceName_ + ": read error after line " + std::to_string(lineNumber_));
+        forEachRecordLine(in, sourceName_, lineNumber_,
+                          [this](const std::string& line, std::size_t length) { parseLine(line, length); });
         if (ranges_.empty()) fail(lineNumber_, "no data record (S1, S2 or S3) in the file");
         return FlashImage(std::move(ranges_));
     }
@@ -35,11 +32,7 @@ private:
         throw FormatError(sourceName_ + ":" + std::to_string(line) + ": " + reason);
     }
 
-    void parseLine(const std::string& line) {
-        std::size_t length = line.size();
-        while (length > 0 && (line[length - 1] == '\r' || line[length - 1] == ' ' || line[length - 1] == '\t'))
-            --length;
-        if (length == 0) return;
+    void parseLine(const std::string& line, std::size_t length) {
         if (ended_) fail(lineNumber_, "record after the end record (S7, S8 or S9)");
         if (length < 2 || line[0] != 'S' || line[1] < '0' || line[1] > '9')
             fail(lineNumber_, "a record starts with 'S' and a type digit");
