@@ -101,16 +101,6 @@ TEST_F(AtomicOutput, ThroughALinkTheFileItPointsToIsReplacedAndTheLinkStays) {
     EXPECT_EQ(std::distance(fs::directory_iterator(folder / "real"), {}), 1);
 }
 
-TEST_F(AtomicOutput, ADeviceIsWrittenInPlaceAndNeverReplaced) {
-    vorant::AtomicOutputFile file("/dev/null");
-    EXPECT_FALSE(file.replacesTarget());
-    EXPECT_TRUE(file.temporaryPath().empty());
-    ASSERT_TRUE(file.write(std::string(100000, 'x')));
-    std::string error;
-    ASSERT_TRUE(file.commit(error)) << error;
-    EXPECT_TRUE(fs::is_character_file("/dev/null"));
-}
-
 // The target changes only at a commit, and then whole, never leaving a
 // temporary file: not when the file is abandoned, and a closed file waits
 // unpublished until the host commits or discards it.

@@ -180,8 +180,6 @@ TEST_P(Frame, StatusRegisterDisplay) {
          {{"STATUS_LOCATION_11", "not_Valid"}, {"STATUS_LOCATION_5", kAbsent}},
          shown("0x0010", "SUS=0 CMP=0 LB3=0 LB2=0 QE=0 SRL=0 SRP=0 SEC=0 BP2=1 BP1=0 BP0=0 WEL=0 BUSY=0")},
         {"no length", {}, 1, both, {}, none, zeros},
-        {"READ_STATUS_ENABLED 'tRuE'", {}, 1, both, {},
-         {{"STATUS_REGISTER_LENGTH", "0"}, {"READ_STATUS_ENABLED", "tRuE"}}, zeros},
         {"READ_STATUS_ENABLED 'TRUE '", {}, 1, Lines{}, {}, {{"READ_STATUS_ENABLED", "TRUE "}}},
         {"disabled", {}, 1, Lines{}, {}, {{"READ_STATUS_ENABLED", "FALSE"}}},
         {"file mode", {}, 1, Lines{}, {.fileMode = true}},

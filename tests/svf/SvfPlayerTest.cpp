@@ -90,13 +90,6 @@ TEST(SvfParser, RefusesMalformedTextWithLineAndReason) {
     }
 }
 
-TEST(SvfParser, TakesAScanOfTheLongestLength) {
-    const std::vector<SvfStatement> statements = parseSvfText("SDR 1048576 TDI (1) TDO (0) MASK (0);");
-    ASSERT_EQ(statements.size(), 1u);
-    EXPECT_EQ(statements[0].scan.length, SvfParser::kMaxScanBits);
-    EXPECT_EQ(statements[0].scan.smask.size(), SvfParser::kMaxScanBits);
-}
-
 TEST(SvfPlayer, StopsAtTheFirstMismatchOrReportsEveryOneWithItsLine) {
     sim::FlashConfig config;
     config.sizeBytes = 64 * 1024;
