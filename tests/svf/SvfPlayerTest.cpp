@@ -72,9 +72,6 @@ TEST(SvfParser, RefusesMalformedTextWithLineAndReason) {
         {"RUNTEST 1 SEC ENDSTATE DRSHIFT;", 1, "RUNTEST: 'DRSHIFT' is not a stable state"},
         {";", 1, "empty statement: ';' without a command"},
         // Lengths past 1 Mibit are refused before their buffers exist.
-        {"SDR 8 TDI (00);\n\nSDR 268435456 TDI (0);", 3,
-         "SDR: length 268435456 is longer than the longest scan accepted (1048576 bits, far more than a flash "
-         "transaction needs)"},
         {"SIR 1048577 TDI (0);", 1,
          "SIR: length 1048577 is longer than the longest scan accepted (1048576 bits, far more than a flash "
          "transaction needs)"},
