@@ -93,8 +93,7 @@ TEST(OpenConfigData, UnusableInputIsRefusedNamingTheFile) {
     writeFile(dir.file("locked.bin"), std::string("x"));
     fs::permissions(dir.file("locked.bin"), fs::perms::none);
     const struct { const char *name, *content, *reason; } cases[] = {
-        {"none.bin", nullptr, "no such file"}, {"none.mcs", nullptr, "no such file"}, {"empty.bin", "", "empty image"},
-        {"empty.hex", "", "empty image"}, {"eof.hex", ":00000001FF\n", "empty image"}, {"folder.bin", nullptr, "is a directory"},
+        {"none.bin", nullptr, "no such file"}, {"eof.hex", ":00000001FF\n", "empty image"}, {"folder.bin", nullptr, "is a directory"},
         {"locked.bin", nullptr, geteuid() == 0 ? nullptr : "cannot open for reading"}};  // root reads any file
     for (const auto& c : cases) {
         if (c.content) writeFile(dir.file(c.name), std::string(c.content));

@@ -87,30 +87,6 @@ TEST_F(AtomicOutput, NamesResolveToWhatAWriteWouldReach) {
     }
 }
 
-TEST_F(AtomicOutput, ThroughALinkTheFileItPointsToIsReplacedAndTheLinkStays) {
-    fs::create_directory(folder / "real");
-    std::ofstream(folder / "real" / "file.bin") << "earlier";
-    fs::create_symlink("real/file.bin", folder / "link");
-    vorant::AtomicOutputFile file(folder / "link");
-    EXPECT_EQ(file.temporaryPath().parent_path(), folder / "real") << "the rename stays in the target's folder";
-    ASSERT_TRUE(file.write("new contents"));
-    std::string error;
-    ASSERT_TRUE(file.commit(error)) << error;
-    EXPECT_TRUE(fs::is_symlink(folder / "link"));
-    EXPECT_EQ(contents(folder / "real" / "file.bin"), "new contents");
-    EXPECT_EQ(std::distance(fs::directory_iterator(folder / "real"), {}), 1);
-}
-
-TEST_F(AtomicOutput, ADeviceIsWrittenInPlaceAndNeverReplaced) {
-    vorant::AtomicOutputFile file("/dev/null");
-    EXPECT_FALSE(file.replacesTarget());
-    EXPECT_TRUE(file.temporaryPath().empty());
-    ASSERT_TRUE(file.write(std::string(100000, 'x')));
-    std::string error;
-    ASSERT_TRUE(file.commit(error)) << error;
-    EXPECT_TRUE(fs::is_character_file("/dev/null"));
-}
-
 // The target changes only at a commit, and then whole, never leaving a
 // temporary file: not when the file is abandoned, and a closed file waits
 // unpublished until the host commits or discards it.

@@ -16,32 +16,6 @@ std::string bits(const RLBitVec& v) {
     return s;
 }
 
-TEST(BitVector, WorkedPageProgramExampleFromTheWireContract) {
-    // Page program of A5 01 at 0x000100: opcode 02 at bit 0, 24-bit address
-    // at bit 8, data at bit 32.
-    RLBitVec frame(48, false);
-    frame.updateBitField("00000010", 0);
-    frame.updateBitField(0x000100u, 8, 24, true);
-    const unsigned char data[] = {0xA5, 0x01};
-    frame.updateBitField(reinterpret_cast<const char*>(data), 32, 16, true);
-    EXPECT_EQ(bits(frame), "00000010" "000000000000000100000000" "10100101" "00000001");
-    // The byte-array construction lays the data out exactly like the frame.
-    RLBitVec page(data, 16);
-    EXPECT_EQ(bits(page), bits(frame).substr(32));
-}
-
-TEST(BitVector, FieldsWrittenAtUnalignedPositionsMatchAlignedOnes) {
-    const unsigned char data[] = {0x9F, 0x3C, 0xE0};
-    RLBitVec aligned(24, false), shifted(27, false);
-    aligned.updateBitField(reinterpret_cast<const char*>(data), 0, 20, true);
-    shifted.updateBitField(reinterpret_cast<const char*>(data), 3, 20, true);
-    EXPECT_EQ(bits(shifted).substr(3, 20), bits(aligned).substr(0, 20));
-    EXPECT_EQ(bits(aligned).substr(0, 20), "10011111001111001110");
-    RLBitVec lsbFirst(8, false);
-    lsbFirst.updateBitField(reinterpret_cast<const char*>(data), 0, 8, false);
-    EXPECT_EQ(lsbFirst.data()[0], 0x9F);
-}
-
 TEST(BitVector, FieldOutsideTheVectorThrowsAndWritesNothing) {
     RLBitVec v(16, false);
     const unsigned char data[] = {0xFF, 0xFF, 0xFF};

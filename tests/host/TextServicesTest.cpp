@@ -5,17 +5,6 @@
 
 namespace {
 
-TEST(TextServices, ICompareIgnoresCaseOnly) {
-    struct Case { const char* a; const char* b; bool equal; };
-    const Case cases[] = {
-        {"TRUE", "TRUE", true}, {"true", "TRUE", true}, {"True", "TRUE", true},
-        {"TRUE ", "TRUE", false}, {"TRUE1", "TRUE", false}, {"", "TRUE", false},
-        {nullptr, "TRUE", false}, {nullptr, nullptr, true},
-    };
-    for (const auto& c : cases)
-        EXPECT_EQ(UT_STR::ICompare(c.a, c.b) == 0, c.equal) << (c.a ? c.a : "(null)") << " vs " << c.b;
-}
-
 TEST(TextServices, IMatchIsACaseInsensitiveWildcardMatch) {
     struct Case { const char* text; const char* pattern; bool match; };
     const Case cases[] = {

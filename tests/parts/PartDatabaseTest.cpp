@@ -176,7 +176,6 @@ TEST(PartDatabase, ShipsTwoHundredPartsOfTwelveMakersOrMoreAndEveryReferencePart
     for (const auto& r : factRows())
         EXPECT_NE(db().hasPart(r.part), kLeftOut.count(r.part) == 1) << r.part << ": ships exactly when not left out";
     EXPECT_TRUE(names.size() >= 200 && makers.size() >= 12) << names.size() << " parts, " << makers.size() << " makers";
-    EXPECT_EQ(ConstraintsManager::deviceKeys().size(), 41u);
     // All its blocks are locked at power-up and only 98h unlocks them, which the plug-in cannot send.
     EXPECT_FALSE(db().hasPart("SST26VF032B"));
 }
@@ -190,12 +189,8 @@ std::vector<Reference> shippedReferences() {
 
 class ShippedPart : public ::testing::TestWithParam<Reference> {};
 
-TEST_P(ShippedPart, ReadsAsTheDeviceReadsItKeepsTheRulesAndMatchesItsDatasheet) {
+TEST_P(ShippedPart, KeepsTheRulesAndMatchesItsDatasheet) {
     const Reference& r = GetParam();
-    for (const auto& key : ConstraintsManager::deviceKeys()) {  // numbers as numbers, the rest as text
-        const bool asText = key.ends_with("_INSTRUCTION") || key == "IDCODE" || kFlags.count(key);
-        EXPECT_NO_THROW(asText ? void(db().getDeviceStringProperty(r.part.c_str(), key.c_str())) : void(db().getDeviceLongProperty(r.part.c_str(), key.c_str()))) << key;
-    }
     const Properties p = readPart(r.part.c_str());
     EXPECT_EQ(brokenKeys(p), std::set<std::string>());
     auto text = [&](const char* key) { return p.count(key) ? p.at(key) : std::string(); };
@@ -232,17 +227,6 @@ TEST(PartDatabase, EveryShippedPartReadsAsTheDeviceReadsItAndKeepsTheRules) {
         for (const auto& key : ConstraintsManager::deviceKeys())
             EXPECT_NO_THROW(db().getDeviceStringProperty(name.c_str(), key.c_str())) << name << " " << key;
         EXPECT_EQ(brokenKeys(readPart(name.c_str())), std::set<std::string>()) << name;
-    }
-}
-
-// Parts that answer one ID must be told apart by something the plug-in or
-// the simulator uses, or be listed together; either way each name is unique
-// regardless of letter case.
-TEST(PartDatabase, NamesAreUniqueRegardlessOfCase) {
-    std::set<std::string> upper;
-    for (std::string name : db().partNames()) {
-        for (char& c : name) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-        EXPECT_TRUE(upper.insert(name).second) << name;
     }
 }
 

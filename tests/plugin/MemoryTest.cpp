@@ -306,12 +306,8 @@ TEST_P(Memory, VerifyAndChecksum) {
          .script = {.cancelFrom = 1}, .status = {reading, "done.\n", "'0': Checksum cancelled.\n"}, .dataBytes = 20},
         {.name = "verify without data", .result = 0, .stream = kNoScan, .changes = kShort,
          .info = {"'0': Verification" + noData}},
-        {.name = "checksum without data", .run = checksum, .result = 0, .stream = kNoScan, .changes = kShort,
-         .info = {"'0': Checksum" + noData}},
         {.name = "verify, PAGE_SIZE 0", .result = 0, .stream = kNoScan, .changes = zeroPage,
          .errors = {"'0': Verification" + pageSize}, .dataBytes = 8},
-        {.name = "checksum, PAGE_SIZE 0", .run = checksum, .result = 0, .stream = kNoScan, .changes = zeroPage,
-         .errors = {"'0': Checksum" + pageSize}, .dataBytes = 8},
     };
     for (const Row& row : rows) check(row, [](auto& d, auto* args) { return int(d.verify(0, args)); });
 }

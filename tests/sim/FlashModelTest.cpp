@@ -15,7 +15,6 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
-#include <random>
 #include <sstream>
 #include <tuple>
 
@@ -108,46 +107,6 @@ TEST(FlashModel, Transcripts) {
     }
 }
 
-// One chip clocked bit by bit, a twin in random pieces of single bits,
-// clockByte and clockBytes at any bit phase: they must not differ.
-TEST(FlashModel, BitByteAndRunClockingAgree) {
-    std::mt19937 random(12345);
-    const Bytes opcodes = hexBytes("06 04 9F 05 35 01 03 0B 02 20 C7 B9 AB 77");
-    FlashModel bits(smallPart()), pieces(smallPart());
-    for (std::size_t a = 0; a < bits.memory().size(); a += 97)
-        bits.memory()[a] = pieces.memory()[a] = static_cast<std::uint8_t>(a);
-    for (int transaction = 0; transaction < 1000; ++transaction) {
-        std::vector<bool> mosi, misoBits, misoPieces;
-        auto push = [&](std::uint32_t byte) { for (int k = 7; k >= 0; --k) mosi.push_back((byte >> k) & 1); };
-        push(opcodes[random() % opcodes.size()]);
-        push(0);
-        push(random() % 2);
-        for (std::size_t n = random() % 300; n > 0; --n) push(random());
-        if (random() % 3 == 0) mosi.resize(mosi.size() + random() % 8, true);
-        bits.select(), pieces.select();
-        for (bool bit : mosi) misoBits.push_back(bits.clockBit(bit));
-        for (std::size_t p = 0; p < mosi.size();) {
-            const std::size_t whole = (mosi.size() - p) / 8, mode = random() % 3;
-            const std::size_t n = whole == 0 || mode == 0 ? 0 : mode == 1 ? 1 : 1 + random() % whole;
-            Bytes in(n), out(n);
-            for (std::size_t i = 0; i < 8 * n; ++i) in[i / 8] = static_cast<std::uint8_t>(in[i / 8] << 1 | mosi[p + i]);
-            if (n == 0) misoPieces.push_back(pieces.clockBit(mosi[p++]));
-            else if (mode == 1) out[0] = pieces.clockByte(in[0]);
-            else pieces.clockBytes(in.data(), out.data(), n);
-            for (std::size_t i = 0; i < 8 * n; ++i) misoPieces.push_back((out[i / 8] >> (7 - i % 8)) & 1);
-            p += 8 * n;
-        }
-        bits.deselect(), pieces.deselect();
-        const std::uint64_t gap = random() % 2000 * 1000;
-        bits.advance(gap), pieces.advance(gap);
-        ASSERT_EQ(misoBits, misoPieces) << transaction;
-        ASSERT_EQ(bits.memory(), pieces.memory());
-        ASSERT_EQ(bits.status1() << 8 | bits.status2(), pieces.status1() << 8 | pieces.status2());
-        ASSERT_EQ(bits.inDeepPowerDown(), pieces.inDeepPowerDown());
-        ASSERT_EQ(bits.now(), pieces.now());
-    }
-}
-
 // Two instances on one file: the second finds the first's programs, erases
 // and status bits.
 TEST(FlashFile, KeepsTheFlashBetweenRuns) {
@@ -227,8 +186,6 @@ TEST(FlashConfig, FromThePartDatabase) {
         {true, {{"QE_LOCATION", "SR1.6"}}, "qe SR1.6/0 rs2 -1 se D8/65536 pp 640 rel 30 s1 DC"},
         {false, {{"ADDRESS_SIZE", "32"}}, "16384K a4 id EF4018"},
         {false, {{"READ_INSTRUCTION", "0000001x"}}, "READ_INSTRUCTION"},
-        {false, {{"JEDEC_ID", "EF40"}}, "JEDEC_ID"},
-        {false, {{"QE_LOCATION", "SR3.0"}}, "QE_LOCATION"},
         {false, {{"ADDRESS_SIZE", "16"}}, "ADDRESS_SIZE"},
         {false, {{"SIM_PAGE_PROGRAM_US", "-1"}}, "SIM_PAGE_PROGRAM_US"},
     };

