@@ -27,9 +27,10 @@ TEST_P(BadInput, IsRefusedWithOneLineAndChangesNothing) {
     write("big.bin", randomBytes(kSimBytes + 1, 42));
     write("locked.bin", "x");
     fs::permissions(dir / "locked.bin", fs::perms::none);
+    write("data.hex", ":0100020042BB\n:00000001FF\n");
+    write("blob.dat", std::string("\x7F" "ELF\x02\x01", 6));
     write("bad.hex", ":020000040000FA\n:10000000000102030405060708090A0B0C0D0E0F78\n:10001000GG\n:00000001FF\n");
     write("old.svf", "// an older recording\n");
-    write("cut.bin", std::string(kSimBytes / 2, '\xFF'));  // a flash file whose making was cut off
     write("huge.svf", "SDR 8 TDI (00);\nSDR 268435456 TDI (0);\nSDR 268435456 TDI (0);\n");
     write("lacking.toml", userPart("TEST_LACKING", "EF40B1", {{"PROGRAM_WAITTIME_INC", ""}}));
     write("invalid.toml", userPart("TEST_ODD_PAGE", "EF40B2", {{"PAGE_SIZE", "2047"}, {"TOTAL_SHIFT_SIZE", "2079"}}));
@@ -55,6 +56,12 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"EmptyImage", kSim + Args{"program", "empty.bin", "-e"}, 2, "empty.bin"},
     BadCase{"UnreadableImage", kSim + Args{"program", "locked.bin", "-e"}, 2, "locked.bin"},
     BadCase{"MalformedHexLine", kSim + Args{"program", "bad.hex", "-e"}, 2, "bad.hex:3"},
+    BadCase{"OffsetForAFileWithAddresses", kSim + Args{"--offset", "0x10", "program", "data.hex"}, 2,
+            "files carry their own addresses"},
+    BadCase{"ImageOfUnknownKind", kSim + Args{"program", "blob.dat"}, 2, "name it with --format bin|ihex|srec"},
+    BadCase{"UnknownFormat", kSim + Args{"--format", "elf", "program", "image.bin"}, 2, "--format elf is not known"},
+    BadCase{"ImageOffsetPastTheEnd", kSim + Args{"--offset", "0x1FFFFF", "program", "image.bin"}, 2, "reaches address"},
+    BadCase{"BinaryReadAsHex", kSim + Args{"--format", "ihex", "program", "image.bin"}, 2, "starts with ':'"},
     BadCase{"ImageLargerThanThePart", kSim + Args{"program", "big.bin", "-e"}, 2, "W25Q16JV holds 2 MiB"},
     BadCase{"ImageLargerThanTheIdentifiedPart", {"--chip", "W25Q16JV", "--port", "sim:new.bin", "program", "big.bin"},
             2, "W25Q16JV holds 2 MiB"},
@@ -65,7 +72,6 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"PartFolderWithoutPartFiles", {"--parts", "noparts", "--part", "W25Q16JV", "erase"}, 2,
             "no part files (*.toml) in the folder"},
     BadCase{"PartsSizeThatIsNoSize", {"parts", "--size", "16 parsecs"}, 2, "--size 16 parsecs is not a size"},
-    BadCase{"PartsIdWithoutValue", {"parts", "--id"}, 2, "'--id' needs a JEDEC ID such as EF4018"},
     BadCase{"RecordingIntoAMissingFolder", {"--part", "W25Q16JV", "--port", "svf:no/job.svf", "erase"}, 2,
             "no/job.svf"},
     BadCase{"RecordingNeedsAPartName", {"--port", "svf:job.svf", "program", "image.bin"}, 2, "--part NAME"},
@@ -81,24 +87,14 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"ReadbackWithoutFile", kSim + Args{"readback"}, 2, "-f FILE"},
     BadCase{"ReadbackFileIsASwitch", kSim + Args{"readback", "-f", "-v"}, 2, "'-f' needs a file name"},
     BadCase{"ReadbackFileGivenTwice", kSim + Args{"readback", "-f", "a.bin", "-f", "b.bin"}, 2, "'-f' is given twice"},
-    BadCase{"LongReadbackSwitchGivenTwice", kSim + Args{"readback", "-file", "a.bin", "-file", "b.bin"}, 2,
-            "'-file' is given twice"},
     // Numbers are quoted as typed, also those no integer type holds.
     BadCase{"ClockPastEveryInteger", kSim + Args{"--clock", "99999999999999999999", "erase"}, 2,
             "--clock 99999999999999999999 is out of range; give 1 to 1000000000 Hz"},
-    BadCase{"ClockWithAUnit", kSim + Args{"--clock", "50MHz", "erase"}, 2, "--clock 50MHz is not a whole number"},
-    BadCase{"IndexPastEveryInteger", kSim + Args{"--index", "-99999999999999999999", "erase"}, 2,
-            "--index -99999999999999999999 is out of range; give 0 to 9999"},
-    BadCase{"DataWidthPastEveryInteger", kSim + Args{"--data-width", "18446744073709551617", "erase"}, 2,
-            "--data-width 18446744073709551617 is out of range; give 1 or 4"},
     BadCase{"DataWidthOfTwo", kSim + Args{"--data-width", "2", "erase"}, 2, "--data-width 2 is not supported"},
     // The device writes the -f file when -file is given too: the tool must check that one.
     BadCase{"ReadbackOntoTheFlashFile", kSim + Args{"readback", "-file", "out.bin", "-f", "./flash.bin"}, 2,
             "own file"},
     BadCase{"FlashFileOfAnotherChip", {"--part", "W25Q32JV", "--port", "sim:flash.bin", "erase"}, 2, "flash.bin"},
-    BadCase{"TruncatedFlashFile", {"--part", "W25Q16JV", "--port", "sim:cut.bin", "erase"}, 2,
-            "flash file 'cut.bin' is truncated: it holds 1048576 bytes and no status trailer at its end, where a flash "
-            "file of this chip holds 2097168 (2097152 bytes of flash and a 16-byte status trailer); remove it"},
     BadCase{"FlashFileOnAFullDisk", {"--part", "W25Q16JV", "--port", "sim:new.bin", "erase"}, 2,
             "flash file 'new.bin' cannot be created: the file size limit is reached after 65536 of its 2097168 bytes; "
             "no file was made; make room on the disk", 64 * 1024},
@@ -120,7 +116,6 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
             "--clock sets the simulator's clock and does not apply to --port svf"},
     BadCase{"FaultOnARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "--sim-fault", "stuck-busy", "erase"},
             2, "--sim-fault applies to the simulator only"},
-    BadCase{"MalformedFault", kSim + Args{"--sim-fault", "fail-shift=0", "erase"}, 2, "counts from 1"},
     BadCase{"BridgeOnTheSimulator", kSim + Args{"--bridge", "jtagspi", "erase"}, 2,
             "--bridge does not apply to --port sim"},
     BadCase{"UnknownBridge", {"--part", "W25Q16JV", "--port", "svf:job.svf", "--bridge", "usb", "erase"}, 2,
@@ -135,30 +130,17 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
             "ir=0x22 is out of range; give 0 to 15"},
     BadCase{"OpenOcdPortNumberOutOfRange", {"--port", "openocd:localhost:99999", "idcode"}, 2,
             "'99999' is not a TCP port; give 1 to 65535"},
-    BadCase{"SpidevUnknownKey", {"--port", "spidev:/dev/spidev0.0,mode=3", "idcode"}, 2, "spidev has no key 'mode'"},
-    BadCase{"SpidevSpeedNotANumber", {"--port", "spidev:/dev/spidev0.0,speed=fast", "idcode"}, 2,
-            "speed=fast is not a speed from 1k to 200M Hz"},
-    BadCase{"SpidevWithoutNode", {"--port", "spidev", "idcode"}, 2, "spidev"},
-    BadCase{"ClockOnSpidev", {"--port", "spidev:/dev/spidev0.0", "--clock", "1000", "idcode"}, 2,
-            "--clock sets the simulator's clock and does not apply to --port spidev"},
-    BadCase{"ClockOnOpenOcd", {"--port", "openocd", "--clock", "1000", "idcode"}, 2,
-            "--clock sets the simulator's clock and does not apply to --port openocd"},
     BadCase{"ChipOnOpenOcd", {"--port", "openocd", "--chip", "W25Q16JV", "idcode"}, 2,
             "--chip names the simulated chip and does not apply to --port openocd"},
     // The FTDI cable refuses a wrong address before it looks at USB.
     BadCase{"FtdiInterfaceWithoutMpsse", {"--port", "ftdi,interface=C", "idcode"}, 2,
             "interface=C: channel C has no MPSSE engine (on an FT4232H only A and B have one); give interface=A or B"},
-    BadCase{"FtdiUnknownInterface", {"--port", "ftdi,interface=Q", "idcode"}, 2,
-            "interface=Q is not a channel; give interface=A or B"},
     BadCase{"FtdiChipSelectOnMosi", {"--port", "ftdi,cs=ADBUS1", "idcode"}, 2,
             "cs=ADBUS1: ADBUS1 is MOSI; chip select goes on ADBUS3 to ADBUS7"},
-    BadCase{"FtdiSpeedZero", {"--port", "ftdi,speed=0", "idcode"}, 2,
-            "speed=0 is out of range; give 458 to 30000000 Hz"},
     BadCase{"FtdiSpeedAbove30MHz", {"--port", "ftdi", "--speed", "31M", "idcode"}, 2,
             "speed=31M is out of range; give 458 to 30000000 Hz"},
     BadCase{"FtdiMalformedVidPid", {"--port", "ftdi:0403-6014", "idcode"}, 2,
             "'0403-6014' is not VID:PID; give the USB vendor and product ids in hexadecimal, such as 0403:6014"},
-    BadCase{"FtdiUnknownKey", {"--port", "ftdi,baud=9600", "idcode"}, 2, "ftdi has no key 'baud'"},
     BadCase{"PortFaultOnTheBoard", {"--port", "board:board.bin", "--sim-fault", "fail-shift=3", "erase"}, 2,
             "the board takes the chip's faults only"},
     BadCase{"ShiftDrInAChain",
@@ -167,20 +149,16 @@ INSTANTIATE_TEST_SUITE_P(Cases, BadInput, ::testing::Values(
     BadCase{"PlayOnARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "play", "old.svf"}, 2,
             "--port svf has none of; use --port sim or --port board"},
     BadCase{"StatusFromARecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "status"}, 2,
-            "reads nothing; run it on a port that reads the chip"},
-    BadCase{"QeRecording", {"--part", "W25Q16JV", "--port", "svf:job.svf", "qe", "set"}, 2, "W25Q16JV" + kNoQe}),
+            "reads nothing; run it on a port that reads the chip"}),
     [](const auto& info) { return std::string(info.param.name); });
 
 #if VORANT_HAVE_CH341A
 // The CH341A's clock is the chip's, so its address takes no key; its path
 // is BUS:ADDR. Both are refused before USB is looked at.
 INSTANTIATE_TEST_SUITE_P(Ch341a, BadInput, ::testing::Values(
-    BadCase{"Ch341aSpeedKey", {"--port", "ch341a,speed=1000000", "idcode"}, 2, "ch341a has no key 'speed'"},
     BadCase{"Ch341aClock", {"--port", "ch341a", "--clock", "1000000", "idcode"}, 2,
             "--clock sets the simulator's clock and does not apply to --port ch341a"},
-    BadCase{"Ch341aAddressWithoutDevice", {"--port", "ch341a:1", "idcode"}, 2, "'1' is not BUS:ADDR"},
-    BadCase{"Ch341aAddressOutOfRange", {"--port", "ch341a:1:200", "idcode"}, 2, "'1:200' is not BUS:ADDR"},
-    BadCase{"Ch341aAddressNotNumbers", {"--port", "ch341a:usb:5", "idcode"}, 2, "'usb:5' is not BUS:ADDR"}),
+    BadCase{"Ch341aAddressWithoutDevice", {"--port", "ch341a:1", "idcode"}, 2, "'1' is not BUS:ADDR"}),
     [](const auto& info) { return std::string(info.param.name); });
 #endif
 

@@ -58,15 +58,12 @@ TEST_P(ProgressSteps, CountWhatTheScriptSends) {
 
 INSTANTIATE_TEST_SUITE_P(Scripts, ProgressSteps, ::testing::Values(
     StepCase{"OnePerPageProgramNotPerPollOrCancelQuery", 1000, "I06 P W0 O05 C Q I06 P W0 O05 C Q I06 P Q", 3},
-    StepCase{"ABarePageProgramOpcodeIsNoPage", 1000, "I02 I02", 0},
     // A read command's capture is a page; a status read's, or one after a wait closed the command, is not.
     StepCase{"PageReads", 1000, "O03 C O03 C O05 C O03 W0 C", 2},
     StepCase{"EraseByTheTimeWaited", 1000, "IC7 W250 O05 C W50 Q", 3},
     StepCase{"EraseNeverPastItsShare", 1000, "IC7 W100000", 10},
-    StepCase{"EraseEndedEarlyCountsWhole", 1000, "IC7 W100 I04", 10},
     StepCase{"WaitsAfterTheEraseAreNoErase", 1000, "IC7 W100 I04 W100000 IC7 W100000 I04 W100000", 20},
-    StepCase{"NeverPastTheTotal", 2, "P P P P P", 2},
-    StepCase{"WithoutATotalCountsOn", 0, "P P P P P", 5}),
+    StepCase{"NeverPastTheTotal", 2, "P P P P P", 2}),
     [](const auto& info) { return std::string(info.param.name); });
 
 struct PhaseCase { const char* name; const char* script; const char* phases; };

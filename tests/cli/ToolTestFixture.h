@@ -154,12 +154,6 @@ protected:
     }
     std::string read(const std::string& name) const { return slurp(dir / name); }
     void write(const std::string& name, const std::string& bytes) const { put(dir / name, bytes); }
-    Args files() const {
-        Args names;
-        for (const auto& entry : fs::directory_iterator(dir)) names.push_back(entry.path().filename().string());
-        std::sort(names.begin(), names.end());
-        return names;
-    }
 
     fs::path root, dir;  // the tool runs in dir; its captured output goes to root
 };

@@ -91,11 +91,11 @@ protected:
 
     // OpenOCD with remote_bitbang to the board, its Tcl server on a free
     // port, then `commands` (each a line of its configuration).
-    void startOpenOcd(const Args& commands = {}, bool waitForTcl = true, int declaredIrLength = 6) {
+    void startOpenOcd(const Args& commands = {}, bool waitForTcl = true) {
         tclPort_ = freePort();
         std::string config = "adapter driver remote_bitbang\nremote_bitbang host 127.0.0.1\n"
                              "remote_bitbang port " + std::to_string(boardPort_) + "\n"
-                             "jtag newtap fpga tap -irlen " + std::to_string(declaredIrLength) + " -expected-id 0x0362d093\n"
+                             "jtag newtap fpga tap -irlen 6 -expected-id 0x0362d093\n"
                              "gdb_port disabled\ntelnet_port disabled\ntcl_port " + std::to_string(tclPort_) + "\n";
         for (const std::string& line : commands) config += line + "\n";
         cli::test::put(root / "board.cfg", config);
