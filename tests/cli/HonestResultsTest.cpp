@@ -46,5 +46,13 @@ TEST_F(ToolTest, QuietStillAnswers) {
     EXPECT_EQ(ok(Args{"--quiet", "--part", "W25Q16JV", "erase"}).out, "");
 }
 
+// Only the command line reads Quad Enable back: a status write the chip
+// ignored (WP# low) is a failure, never "succeeded".
+TEST_F(ToolTest, QuadEnableThatDidNotStickIsAFailure) {
+    const Result set = run(Args{"--part", "W25Q32JV", "--sim-fault", "status-locked", "qe", "set"});
+    EXPECT_EQ(set.status, 1) << set.text();
+    EXPECT_TRUE(has(set.err, "Quad Enable was to be set but status register 2 reads 0x00 (QE clear)")) << set.text();
+}
+
 }  // namespace
 }  // namespace vorant::cli::test
