@@ -80,31 +80,6 @@ TEST(BoardModel, AnswersIdcodeBypassAndTheIrCapture) {
     EXPECT_EQ(board.instruction(), 0x09u) << "reset selects IDCODE again";
 }
 
-// Between an 8-bit and a 4-bit TAP: IR scans cover all three IRs, the
-// others' DR is one bypass bit each, and IDCODE comes out after the one
-// bypass bit nearest TDO.
-TEST(BoardModel, SitsInAChainOfBypassTaps) {
-    sim::FlashModel flash(tinyChip());
-    BoardSettings settings;
-    unsigned irLength = 0;
-    settings.chain = parseJtagChain("8,[6],4", irLength);
-    BoardModel board(flash, settings);
-    resetToIdle(board);
-    BitBuffer tdo;
-    scanDr(board, bits(0, 1 + 32 + 1), tdo);
-    BitBuffer id;
-    id.appendRange(tdo.data(), 1, 32);
-    EXPECT_EQ(value(id), 0x0362D093u);
-
-    // 4 ones for the TAP at TDO, our 0x02, 8 ones for the TAP at TDI.
-    BitBuffer ir = bits(0xF, 4);
-    ir.append(bits(0x02, 6).data(), 6);
-    ir.append(bits(0xFF, 8).data(), 8);
-    scanIr(board, ir, tdo);
-    EXPECT_EQ(board.instruction(), 0x02u);
-    EXPECT_EQ(value(tdo), 0x1u | (0x1u << 4) | (0x1u << 10)) << "each IR captures ...01";
-}
-
 TEST(BoardModel, CountsTimeInTckCycles) {
     sim::FlashModel flash(tinyChip());
     BoardSettings settings;

@@ -65,17 +65,6 @@ protected:
     SpiCablePort port{"cable", bus};
 };
 
-TEST_F(SpiCablePortTest, AnIdReadIsOneTransactionAndItsReplyLandsInScanOrder) {
-    bus.answer = {0xEF, 0x40, 0x18};
-    ASSERT_TRUE(send(ScanStage::kOpen, {0x9F}));
-    RLBitVec tdi(24, false), tdo(24, true), mask(24, false);
-    ASSERT_TRUE(port.shift(ScanStage::kCaptureClose, &tdi, nullptr, &tdo, &mask));
-    EXPECT_EQ(bus.log, std::vector<std::string>({"tx 9F >3"}));
-    const RLBitVec expected = wireBytes({0xEF, 0x40, 0x18});
-    EXPECT_EQ(std::vector<unsigned char>(tdo.data(), tdo.data() + 3),
-              std::vector<unsigned char>(expected.data(), expected.data() + 3));
-}
-
 // The unlock's status write is left open; the wait deselects it, puts it
 // on the wire, and only then lets its time pass.
 TEST_F(SpiCablePortTest, AWaitClosesFlushesThenPauses) {
