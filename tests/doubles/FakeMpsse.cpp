@@ -276,11 +276,7 @@ FakeFtdiUsb::FakeFtdiUsb(FakeMpsse* device) : device_(device) {
             if (std::find(ids.begin(), ids.end(), found.id) != ids.end()) listing.devices.push_back(found);
         return listing;
     };
-    ftdiUsb().open = [this](const FtdiOpenRequest& request) {
-        char text[48];
-        std::snprintf(text, sizeof text, "open %04x:%04x %u:%u %c", request.id.vendor, request.id.product,
-                      request.location.bus, request.location.address, request.channel);
-        log.push_back(text);
+    ftdiUsb().open = [this](const FtdiOpenRequest&) {
         FtdiOpening opening;
         if (openFailure != FtdiUsbFailure::None || device_ == nullptr) {
             opening.failure = openFailure == FtdiUsbFailure::None ? FtdiUsbFailure::NotFound : openFailure;

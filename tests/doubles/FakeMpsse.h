@@ -116,7 +116,7 @@ public:
     // What the open answers instead of a device.
     ports::ftdi::FtdiUsbFailure openFailure = ports::ftdi::FtdiUsbFailure::None;
     std::string openFailureDetail;
-    // The requests made: "list 0403:6014 0403:6010", "open 0403:6014 1:7 A".
+    // The listings asked for: "list 0403:6014 0403:6010".
     std::vector<std::string> log;
 
 private:
