@@ -59,7 +59,6 @@ public:
     int answerSizeChange = -1;
     bool answerWithheld = false;
 
-    bool gone() const { return gone_; }
     bool chipSelected() const { return csLow_; }
 
 private:

@@ -6,7 +6,8 @@
 // controller would (word size, nbits, speed, the bounce buffers against
 // bufsiz, transfers without buffers, the transfer count), and clocks the
 // transfers into a simulated flash with chip select held across the
-// message. Every ioctl is one log line; faults can be scripted.
+// message. cs_change and delays, which a flash port has no use for, are
+// refused. Every ioctl is one log line; faults can be scripted.
 
 #include "ports/sim/FlashModel.h"
 #include "ports/spidev/SpidevIo.h"
