@@ -92,38 +92,6 @@ TEST_F(MpsseSequence, WriteEnableAndStatusReadAreTheReferenceBytes) {
     }
 }
 
-// The write enable and page program of a page are one USB write at the
-// wait; the status poll after it is one write and one read.
-TEST_F(MpsseSequence, APageProgramIsOneUsbWrite) {
-    open("ftdi");
-    const auto before = mpsse->writeCount();
-    RLBitVec writeEnable = bits("00000110");
-    RLBitVec program = bits("00000010" + std::string(24, '0') + std::string(256 * 8, '0'));
-    ASSERT_TRUE(scan().shiftWrite(ScanStage::kWhole, &writeEnable, 0));
-    ASSERT_TRUE(scan().shiftWrite(ScanStage::kWhole, &program, 0));
-    EXPECT_EQ(mpsse->writeCount(), before) << "nothing reads: both are held";
-    ASSERT_TRUE(scan().wait(700, true));
-    EXPECT_EQ(mpsse->writeCount(), before + 1);
-    EXPECT_EQ(flash.memory()[0], 0x00);
-}
-
-// A read longer than one write's reply goes out in pieces with chip select
-// held low, and comes back whole and in order.
-TEST_F(MpsseSequence, ALongReadComesBackWholeAcrossWrites) {
-    for (std::size_t i = 0; i < 1500; ++i) flash.memory()[i] = static_cast<std::uint8_t>(i * 7 + i / 256);
-    open("ftdi");
-    RLBitVec read = bits("00000011" + std::string(24, '0'));
-    ASSERT_TRUE(scan().shiftWrite(ScanStage::kOpen, &read, 0));
-    RLBitVec tdi(1500 * 8, false), tdo(1500 * 8, true), mask(1500 * 8, false);
-    ASSERT_TRUE(scan().shift(ScanStage::kCaptureClose, &tdi, nullptr, &tdo, &mask));
-    for (std::size_t i = 0; i < 1500; ++i) {
-        std::uint8_t byte = 0;
-        for (int k = 0; k < 8; ++k) byte = static_cast<std::uint8_t>(byte << 1 | (tdo.getBit(i * 8 + k) ? 1 : 0));
-        ASSERT_EQ(byte, flash.memory()[i]) << "byte " << i;
-    }
-    EXPECT_GT(mpsse->readCount(), 2u);
-}
-
 // speed= is rounded down to a step of 30 MHz / (divisor + 1).
 TEST_F(MpsseSequence, SpeedRoundsDownToAStepOfTheDivider) {
     const std::pair<const char*, double> rows[] = {
@@ -133,56 +101,6 @@ TEST_F(MpsseSequence, SpeedRoundsDownToAStepOfTheDivider) {
     for (const auto& [address, hz] : rows) {
         open(address);
         EXPECT_DOUBLE_EQ(mpsse->sckHz(), hz) << address;
-    }
-}
-
-// The double itself, on the reference's examples and on the mistakes a
-// port could make: a reply where the reference gives one, a refusal where
-// the chip would clock garbage.
-TEST_F(MpsseSequence, TheDoubleAnswersLikeTheReferenceAndCatchesAMisdrivenBus) {
-    struct Row {
-        const char* name;
-        Bytes write;
-        Bytes reply;          // when the write is accepted
-        std::string refusal;  // when it is not
-    };
-    const Row rows[] = {
-        {"ID, MSB first",
-         {0x80, 0x00, 0x0B, 0x11, 0x00, 0x00, 0x9F, 0x20, 0x02, 0x00, 0x80, 0x08, 0x0B, 0x87},
-         {0xEF, 0x40, 0x18},
-         ""},
-        {"ID, LSB first",
-         {0x80, 0x00, 0x0B, 0x19, 0x00, 0x00, 0xF9, 0x28, 0x02, 0x00, 0x80, 0x08, 0x0B, 0x87},
-         {0xF7, 0x02, 0x18},
-         ""},
-        {"ID, 4 bits then 4",
-         {0x80, 0x00, 0x0B, 0x11, 0x00, 0x00, 0x9F, 0x22, 0x03, 0x22, 0x03, 0x80, 0x08, 0x0B, 0x87},
-         {0x0E, 0x0F},
-         ""},
-        {"unknown opcode", {0xAB, 0x87}, {0xFA, 0xAB}, ""},
-        {"chip select high", {0x80, 0x08, 0x0B, 0x11, 0x00, 0x00, 0x06}, {}, "with chip select (ADBUS3) high"},
-        {"SCK an input", {0x80, 0x00, 0x0A, 0x11, 0x00, 0x00, 0x06}, {}, "SCK (ADBUS0) not an output"},
-        {"MOSI an input", {0x80, 0x00, 0x09, 0x11, 0x00, 0x00, 0x06}, {}, "MOSI (ADBUS1) not an output"},
-        {"out on the rising edge", {0x80, 0x00, 0x0B, 0x10, 0x00, 0x00, 0x06}, {}, "on the rising edge"},
-        {"3-phase clocking", {0x8C, 0x80, 0x00, 0x0B, 0x11, 0x00, 0x00, 0x06}, {}, "3-phase"},
-        {"length cut short", {0x80, 0x00, 0x0B, 0x11, 0x00}, {}, "malformed MPSSE command 11: its length"},
-        {"data cut short", {0x80, 0x00, 0x0B, 0x11, 0x01, 0x00, 0x06}, {}, "carries 2 data bytes"},
-    };
-    for (const Row& row : rows) {
-        FakeMpsse device(flash);
-        ASSERT_TRUE(device.setBitmode(0x00, 0x02));
-        ASSERT_TRUE(device.write(Bytes{0x8A, 0x97}));
-        const bool accepted = device.write(row.write);
-        EXPECT_EQ(accepted, row.refusal.empty()) << row.name << ": " << device.error();
-        if (!accepted) {
-            EXPECT_NE(device.error().find(row.refusal), std::string::npos) << row.name << ": " << device.error();
-            continue;
-        }
-        Bytes reply(row.reply.size() + 1);
-        std::size_t got = 0;
-        ASSERT_TRUE(device.read(reply, got, std::chrono::milliseconds(0)));
-        reply.resize(got);
-        EXPECT_EQ(reply, row.reply) << row.name;
     }
 }
 

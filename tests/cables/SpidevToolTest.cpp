@@ -118,21 +118,11 @@ TEST_F(SpidevTool, FailuresEndTheRunWithTheirCause) {
     const Failure failures[] = {
         {"unplugged during program", [](FakeSpidevNode& n) { n.device.vanishAfterMessages = 900; }, program,
          "the SPI device is gone", true},
-        {"unbound during program (ENODEV)",
-         [](FakeSpidevNode& n) {
-             n.device.vanishAfterMessages = 900;
-             n.device.vanishErrno = ENODEV;
-         },
-         program, "No such device", true},
         {"a wrong byte count in the ID read", [](FakeSpidevNode& n) { n.device.miscountAtMessage = 1; },
          {"--part", "auto", "idcode"}, "the reply is not used", true},
         {"no chip on the bus", [](FakeSpidevNode& n) { n.device = FakeSpidev(nullptr); }, {"--part", "auto", "idcode"},
          "no chip answered the JEDEC ID read (it read FFFFFF", true},
         {"absent node", [](FakeSpidevNode& n) { n.openError = ENOENT; }, program, "cannot open /dev/spidev0.0", false},
-        {"access refused", [](FakeSpidevNode& n) { n.openError = EACCES; }, program,
-         "SUBSYSTEM==\"spidev\", GROUP=\"spi\", MODE=\"0660\"", false},
-        {"not a spidev node", [](FakeSpidevNode& n) { n.device.notSpidev = true; }, program,
-         "is not a spidev device", false},
     };
     for (const Failure& failure : failures) {
         SCOPED_TRACE(failure.name);

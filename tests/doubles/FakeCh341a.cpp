@@ -131,7 +131,6 @@ bool FakeCh341a::packet(const std::uint8_t* bytes, std::size_t length) {
 bool FakeCh341a::streamSetup(const std::uint8_t* bytes, std::size_t length) {
     if (length < 3 || (bytes[1] & 0xF8) != 0x60 || bytes[2] != 0x00)
         return refuse("stream setup is not AA 60|mode 00: " + hex(bytes, std::min<std::size_t>(length, 3)));
-    streamMode_ = bytes[1] & 0x07;
     note(log, "stream " + hex(bytes + 1, 1));
     return true;
 }
@@ -159,19 +158,12 @@ bool FakeCh341a::uioStream(const std::uint8_t* bytes, std::size_t length) {
                 line += token;
                 if (!chipSelectFollowsPins()) return false;
                 break;
-            case 0xC0:
-                flash_.advance((sub & 0x3Fu) * 1000u);
-                line += " delay=" + std::to_string(sub & 0x3F);
-                break;
             default:
-                if (sub == 0x20) {
-                    note(log, line);
-                    return true;
-                }
-                if (sub != 0x00) return refuse("unknown UIO sub-command " + hex(&sub, 1));
-                // Inputs read high (pull-ups), MISO included while deselected.
-                answers_.push_back({static_cast<std::uint8_t>(0xC0 | (pins_ & directions_) | (~directions_ & 0x3F))});
-                line += " sample";
+                // Delays and pin samples are not modelled: a port driving SPI
+                // has no use for them.
+                if (sub != 0x20) return refuse("unknown UIO sub-command " + hex(&sub, 1));
+                note(log, line);
+                return true;
         }
     }
     return refuse("UIO stream without its end (20): " + hex(bytes, length));
@@ -195,7 +187,6 @@ bool FakeCh341a::chipSelectFollowsPins() {
 bool FakeCh341a::spiStream(const std::uint8_t* bytes, std::size_t length) {
     const std::size_t count = length - 1;
     if (count == 0) return refuse("SPI stream packet without data");
-    if (streamMode_ & 0x04) return refuse("SPI stream in two-line mode, which this double does not model");
     if (!csLow_) return refuse("SPI data while chip select is high");
     if ((directions_ & (kSck | kMosi)) != (kSck | kMosi))
         return refuse("SPI data with SCK or MOSI not driven (D3 and D5 must be outputs)");

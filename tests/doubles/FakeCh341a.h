@@ -3,9 +3,9 @@
 // double, written from the device's stream protocol and never from the
 // port's code. Each OUT transfer is cut into 32-byte packets, and each
 // packet is one command:
-//   AA 60|mode .. 00       stream setup (mode bit 2: two data lines, not modelled)
+//   AA 60|mode .. 00       stream setup
 //   AB sub-commands .. 20  UIO stream: 80|v drives D5..D0, 40|d sets their
-//                          directions, C0|n waits n us, 00 samples D7..D0
+//                          directions
 //   A8 data (1..31)        SPI stream: each byte shifted LSB first, answered
 //                          by one IN packet of the bytes clocked in
 // Pin D0 is CS0# of a simulated flash: low (and driven) selects it, high
@@ -59,7 +59,6 @@ public:
     int answerSizeChange = -1;
     bool answerWithheld = false;
 
-    bool gone() const { return gone_; }
     bool chipSelected() const { return csLow_; }
 
 private:
@@ -79,7 +78,7 @@ private:
     BulkResult result(BulkResult outcome, const std::string& error);
 
     sim::FlashModel& flash_;
-    std::uint8_t pins_ = 0x3F, directions_ = 0x00, streamMode_ = 0;
+    std::uint8_t pins_ = 0x3F, directions_ = 0x00;
     bool csLow_ = false, gone_ = false;
     std::uint64_t spiPackets_ = 0;
     std::deque<std::vector<std::uint8_t>> answers_;

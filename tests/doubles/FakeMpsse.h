@@ -1,16 +1,15 @@
 #pragma once
 // An FTDI channel with its MPSSE engine, as a test double behind the FTDI
 // seam, written from FTDI's MPSSE command reference and never from the
-// port's code. Once set_bitmode asks for MPSSE it interprets the command
-// bytes (clock set-up, pins, the clock-data commands by their bit meanings,
-// send immediate), drives a simulated flash pin by pin (the chip select
-// pin falling selects it, rising deselects it), advances the flash's clock
-// by every bit at the divisor's frequency, and queues the bytes clocked in
-// for the next read. An unknown opcode is answered FA and the opcode, as
-// the chip does. A truncated command, or a port that clocks data with chip
-// select high, with SCK or MOSI not outputs, or on the wrong edges for SPI
-// mode 0, fails the write with a clear error (the chip would clock garbage).
-// One log line per command: "8A", "86 0000", "80 08 0B", "11 0000 06", "87".
+// port's code. Once set_bitmode asks for MPSSE it interprets what an SPI
+// master sends (clock set-up, the low pins, byte-wide MSB-first data
+// commands, send immediate), drives a simulated flash by its chip select
+// pin, advances the flash's clock at the divisor's frequency, and queues
+// the bytes clocked in for the next read. Any other opcode is answered FA
+// and the opcode, as the chip answers one it does not know. A truncated
+// command, or a port that clocks data with chip select high, with SCK or
+// MOSI not outputs, on the wrong edges for SPI mode 0 or with an engine
+// setting left on, fails the write with a clear error.
 
 #include "ports/ftdi/FtdiIo.h"
 #include "ports/sim/FlashModel.h"
@@ -41,8 +40,6 @@ public:
     std::unique_ptr<ports::ftdi::FtdiIo> handle();
 
     struct Faults {
-        int failWrite = 0;          // this write (from 1) fails; the device stays
-        int failRead = 0;           // this read (from 1) fails
         int vanishAfterWrites = 0;  // after this many writes the device is gone from USB
         int shortReplyAtRead = 0;   // this read loses the last byte the chip sent
         int strayByteAtRead = 0;    // this read finds a stray byte ahead of the reply
@@ -53,7 +50,7 @@ public:
     };
     Faults faults;
 
-    // One line per command, set_bitmode and purge ("bitmode 02", "purge").
+    // One line per set_bitmode and purge ("bitmode 02", "purge").
     std::vector<std::string> log;
     bool keepLog = true;
     // Every USB write as written.
@@ -78,7 +75,6 @@ private:
     bool refuse(const std::string& why);
     bool misused(const std::string& why);
     bool checkPinsForClocking(std::uint8_t opcode);
-    bool clockOneBit(bool mosi);
     void setLowPins(std::uint8_t levels, std::uint8_t directions);
     bool chipSelectHigh() const;
     void note(std::string line);
@@ -120,7 +116,7 @@ public:
     // What the open answers instead of a device.
     ports::ftdi::FtdiUsbFailure openFailure = ports::ftdi::FtdiUsbFailure::None;
     std::string openFailureDetail;
-    // The requests made: "list 0403:6014 0403:6010", "open 0403:6014 1:7 A".
+    // The listings asked for: "list 0403:6014 0403:6010".
     std::vector<std::string> log;
 
 private:

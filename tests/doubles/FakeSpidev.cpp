@@ -21,8 +21,6 @@ constexpr std::uint8_t kControllerModeBits = kCpha | kCpol | kCsHigh | kNoCs;
 constexpr std::uint64_t kBounceAlignment = 8;
 // The kernel's SPI_IOC_MESSAGE size field has 14 bits.
 constexpr std::size_t kRecordBytes = 32, kSizeFieldLimit = 1u << 14;
-// The core's pause between a cs_change deselect and the next select.
-constexpr std::uint64_t kCsChangeGapNs = 10'000;
 
 // struct spi_ioc_transfer as the kernel copies it in, read at its
 // documented offsets.
@@ -138,6 +136,8 @@ long FakeSpidev::message(std::span<const ports::spidev::SpidevTransfer> transfer
             return -static_cast<long>(error);
         };
         if (r.bitsPerWord != 0 && r.bitsPerWord != 8) return refuse("word size", EINVAL);
+        // cs_change and delays are not modelled: a flash port has no use for them.
+        if (r.csChange != 0 || r.delayUs != 0) return refuse("cs_change or delay", EINVAL);
         if (r.txNbits > 1 || r.rxNbits > 1) return refuse("dual or quad transfer", EINVAL);
         if ((r.tx != 0 && r.tx < 4096) || (r.rx != 0 && r.rx < 4096)) return refuse("bad buffer", EFAULT);
         if (r.tx != 0) txBuffer += roundUp(r.len);
@@ -161,11 +161,8 @@ long FakeSpidev::message(std::span<const ports::spidev::SpidevTransfer> transfer
     const bool clockPhaseFits = (mode_ & (kCpha | kCpol)) == 0 || (mode_ & (kCpha | kCpol)) == (kCpha | kCpol);
     const bool selectFits = (mode_ & kNoCs) == 0 && ((mode_ & kCsHigh) == 0 || (forcedModeBits & kCsHigh) != 0);
     sim::FlashModel* flash = clockPhaseFits && selectFits ? flash_ : nullptr;
-    const auto select = [&] {
-        ++chipSelects;
-        if (flash) flash->select();
-    };
-    if (!selected_) select();
+    ++chipSelects;
+    if (flash) flash->select();
     if (records.front().tx != 0 && records.front().len > 0) ++messagesByFirstByte[bytesAt(records.front().tx)[0]];
     for (std::size_t i = 0; i < records.size(); ++i) {
         const Record& r = records[i];
@@ -182,24 +179,13 @@ long FakeSpidev::message(std::span<const ports::spidev::SpidevTransfer> transfer
                 std::memset(in, 0xFF, r.len);
             }
         }
-        if (flash && r.delayUs != 0) flash->advance(r.delayUs * 1000ull);
-        if (r.csChange && i + 1 < records.size()) {
-            if (flash) {
-                flash->deselect();
-                flash->advance(kCsChangeGapNs);
-            }
-            select();
-        }
     }
-    // cs_change on the last transfer leaves chip select asserted.
-    selected_ = records.back().csChange != 0;
-    if (!selected_ && flash_ && flash_->selected()) flash_->deselect();
+    if (flash_ && flash_->selected()) flash_->deselect();
     note(line);
     return static_cast<long>(messages == miscountAtMessage ? total - 1 : total);
 }
 
 void FakeSpidev::sleep(std::uint64_t microseconds) {
-    sleptMicroseconds += microseconds;
     if (flash_) flash_->advance(microseconds * 1000);
 }
 

@@ -6,7 +6,8 @@
 // controller would (word size, nbits, speed, the bounce buffers against
 // bufsiz, transfers without buffers, the transfer count), and clocks the
 // transfers into a simulated flash with chip select held across the
-// message. Every ioctl is one log line; faults can be scripted.
+// message. cs_change and delays, which a flash port has no use for, are
+// refused. Every ioctl is one log line; faults can be scripted.
 
 #include "ports/sim/FlashModel.h"
 #include "ports/spidev/SpidevIo.h"
@@ -60,7 +61,7 @@ public:
     std::uint64_t miscountAtMessage = 0;
 
     // What went over the bus.
-    std::uint64_t ioctls = 0, messages = 0, chipSelects = 0, sleptMicroseconds = 0;
+    std::uint64_t ioctls = 0, messages = 0, chipSelects = 0;
     // Messages clocked, by the first byte they sent.
     std::array<std::uint64_t, 256> messagesByFirstByte{};
 
@@ -72,8 +73,6 @@ private:
     std::uint8_t mode_ = 0;
     std::uint8_t bitsPerWord_ = 0;
     std::uint32_t speedHz_ = 500'000;
-    // Left asserted by cs_change on a message's last transfer.
-    bool selected_ = false;
     std::vector<std::uint8_t> zeros_, scratch_;
 };
 

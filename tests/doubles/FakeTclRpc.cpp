@@ -89,10 +89,6 @@ bool FakeTclRpc::execute(const std::string& command, std::string& result) {
         board_.flash().advance(std::stoull(w[1]) * 1'000'000ull);
         return true;
     }
-    if (w[0] == "runtest" && w.size() == 2) {
-        ports::jtag::runIdle(board_, std::stoull(w[1]));
-        return true;
-    }
     result = "invalid command name \"" + w[0] + "\"";
     return false;
 }

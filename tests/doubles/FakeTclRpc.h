@@ -2,7 +2,7 @@
 // OpenOCD's Tcl RPC server as a test double, written from its published
 // behaviour and never from the port's code: each request must be
 // `list [catch {CMD; CMD...} r] $r`; irscan, drscan (one field, 0x value),
-// sleep, runtest and `jtag names` act on a simulated board pin by pin; the
+// sleep and `jtag names` act on a simulated board pin by pin; the
 // reply is "0 RESULT" or "1 {MESSAGE}" as OpenOCD gives them. Every request
 // is logged as one line, and faults can be scripted.
 

@@ -1,7 +1,5 @@
 // The CH341A cable against its double: the packets of a write enable and a
-// status read byte for byte (written from the stream protocol: CS0# on D0
-// through UIO packets, data in A8 packets, every byte mirrored), long
-// transfers cut into packets, and answers that come wrong, late or not at
+// status read byte for byte, and answers that come wrong, late or not at
 // all failing instead of becoming data.
 
 #include "host/RLBitVec.h"
@@ -43,10 +41,6 @@ protected:
         const spi::SpiSegment segments[] = {{&opcode, 1, nullptr}, {&filler, 1, &status}};
         return bus->transact(segments);
     }
-    void openBus() {
-        bus = std::make_unique<Ch341aBus>(fake.connect());
-        ASSERT_TRUE(bus->start()) << bus->error();
-    }
 
     sim::FlashModel flash;
     FakeCh341a fake;
@@ -79,22 +73,6 @@ TEST_F(Ch341aBusTest, WriteEnableAndStatusReadAreTheseBytes) {
     EXPECT_EQ(fake.transfers.back(), "AB B7 40 20") << "the pins are let go at the end";
 }
 
-// 03h, a 3-byte address and 256 bytes read: 260 bytes clocked, so nine SPI
-// packets (8 x 31 + 12), each answered, the page kept from the last 256.
-TEST_F(Ch341aBusTest, ALongTransactionIsCutIntoPacketsAndItsAnswersJoined) {
-    for (std::size_t i = 0; i < 256; ++i) flash.memory()[0x100 + i] = static_cast<std::uint8_t>(i * 7 + 3);
-    openBus();
-    const std::uint8_t command[] = {0x03, 0x00, 0x01, 0x00};
-    std::vector<std::uint8_t> zeros(256, 0), page(256, 0);
-    const spi::SpiSegment segments[] = {{command, 4, nullptr}, {zeros.data(), 256, page.data()}};
-    ASSERT_TRUE(bus->transact(segments)) << bus->error();
-    EXPECT_EQ(page, std::vector<std::uint8_t>(flash.memory().begin() + 0x100, flash.memory().begin() + 0x200));
-    ASSERT_EQ(fake.transfers.size(), 1u + 9u);
-    EXPECT_EQ(fake.transfers[1].substr(0, 3 * 37 - 1), padded("AB B6 20") + " A8 C0 00 80 00");  // 03 00 01 00
-    EXPECT_EQ(fake.transfers.back().size(), 13u * 3 - 1) << "A8 and the last 12 bytes";
-    EXPECT_EQ(fake.inTransfers, 1u + 9u);  // the drain at start, then one per packet
-}
-
 // Whatever goes wrong with an answer, the caller's bytes stay as they were
 // and the bus says what happened; a device still there works on.
 TEST_F(Ch341aBusTest, AWrongLateOrMissingAnswerIsAFailureNeverData) {
@@ -112,12 +90,6 @@ TEST_F(Ch341aBusTest, AWrongLateOrMissingAnswerIsAFailureNeverData) {
              f.answerSizeChange = -1;
          },
          "the CH341A answered an SPI packet of 2 bytes with 1 bytes", false},
-        {"long",
-         [](FakeCh341a& f) {
-             f.answerFaultAtSpiPacket = 1;
-             f.answerSizeChange = 1;
-         },
-         "the CH341A answered an SPI packet of 2 bytes with 3 bytes", false},
         {"none",
          [](FakeCh341a& f) {
              f.answerFaultAtSpiPacket = 1;
@@ -150,36 +122,6 @@ TEST_F(Ch341aBusTest, AWrongLateOrMissingAnswerIsAFailureNeverData) {
         EXPECT_FALSE(device.chipSelected());
         bus.reset();
     }
-}
-
-// The double refuses what the device would not run, so a port that sends
-// it cannot pass.
-TEST_F(Ch341aBusTest, TheDoubleRefusesMalformedPackets) {
-    const std::pair<std::vector<std::uint8_t>, std::string> rows[] = {
-        {{0xA8, 0x60}, "SPI data while chip select is high"},
-        {{0x55, 0x00}, "unknown command 55"},
-        {{0xAB, 0xB6}, "UIO stream without its end (20)"},
-        {{0xAB, 0xBE, 0x7F, 0x20}, "SCK high as chip select falls"},
-        {{0xAB, 0xB6, 0x41, 0x20, 0xA8, 0x60}, "SPI data with SCK or MOSI not driven"},
-    };
-    for (const auto& [bytes, refusal] : rows) {
-        FakeCh341a device(flash);
-        std::vector<std::uint8_t> transfer = bytes;
-        if (transfer[0] == 0xAB && transfer.size() > 4) transfer.insert(transfer.begin() + 4, 28, 0x00);
-        EXPECT_EQ(device.connect()->bulkOut(transfer.data(), transfer.size(), std::chrono::milliseconds(10)),
-                  BulkResult::Failed);
-        EXPECT_EQ(device.refusal.rfind(refusal, 0), 0u) << device.refusal;
-    }
-    // A command longer than a packet spills into the next, whose first byte
-    // is no command.
-    FakeCh341a device(flash);
-    std::vector<std::uint8_t> transfer = {0xAB, 0xB6, 0x7F, 0x20};
-    transfer.resize(32, 0x00);
-    transfer.push_back(0xA8);
-    transfer.resize(32 + 40, 0x00);
-    EXPECT_EQ(device.connect()->bulkOut(transfer.data(), transfer.size(), std::chrono::milliseconds(10)),
-              BulkResult::Failed);
-    EXPECT_EQ(device.refusal, "unknown command 00");
 }
 
 }  // namespace

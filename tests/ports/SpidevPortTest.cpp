@@ -77,7 +77,6 @@ struct OpenCase {
 // and a bad key does not even open the node.
 TEST_F(SpidevPortTest, OpensWhatAFlashCanUseAndRefusesTheRest) {
     const OpenCase cases[] = {
-        {"defaults", "spidev:/dev/spidev0.0", nullptr, ""},
         {"a GPIO chip select reads back CS_HIGH", "spidev:/dev/spidev0.0",
          [](FakeSpidevNode& n) { n.device.forcedModeBits = 0x04; }, ""},
         {"speed in kHz", "spidev:/dev/spidev0.0,speed=500k", nullptr, ""},
