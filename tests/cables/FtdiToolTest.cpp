@@ -110,6 +110,10 @@ TEST_F(FtdiTool, ACableThatFailsIsOneClearErrorNeverSuccess) {
          "a short or late reply from the FTDI device: 4 of the 5 bytes expected", true},
         {"reply out of step", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.strayByteAtRead = 2; }, idcode,
          "a malformed reply from the FTDI device: it should end in FA AA but ends in 18 FA", true},
+        // A status poll that fails leaves the bus failed: the device stops
+        // polling and names the reply, never a time-out.
+        {"short reply while polling", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.shortReplyAtRead = 8; }, program,
+         "a short or late reply from the FTDI device", true},
         {"unplugged while programming", [](FakeMpsse& m, FakeFtdiUsb&) { m.faults.vanishAfterWrites = 40; }, program,
          "the FTDI device is gone from USB", true},
     };
